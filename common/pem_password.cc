@@ -1,0 +1,3 @@
+#include "common/pem_password.h"
+
+int RefusePemPassword(char*, int, int, void*) { return -1; }

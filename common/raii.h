@@ -1,0 +1,33 @@
+#ifndef ORVA_COMMON_RAII_H_
+#define ORVA_COMMON_RAII_H_
+
+#include <openssl/bio.h>
+#include <openssl/evp.h>
+#include <openssl/x509.h>
+
+#include <cstdio>
+#include <memory>
+
+// Owners for C resources: each is released on every path by its deleter.
+
+struct FileCloser {
+  void operator()(FILE* file) const { std::fclose(file); }
+};
+using FilePtr = std::unique_ptr<FILE, FileCloser>;
+
+struct X509Deleter {
+  void operator()(X509* certificate) const { X509_free(certificate); }
+};
+using X509Ptr = std::unique_ptr<X509, X509Deleter>;
+
+struct EvpPkeyDeleter {
+  void operator()(EVP_PKEY* key) const { EVP_PKEY_free(key); }
+};
+using EvpPkeyPtr = std::unique_ptr<EVP_PKEY, EvpPkeyDeleter>;
+
+struct BioDeleter {
+  void operator()(BIO* bio) const { BIO_free(bio); }
+};
+using BioPtr = std::unique_ptr<BIO, BioDeleter>;
+
+#endif  // ORVA_COMMON_RAII_H_

@@ -1,0 +1,89 @@
+#include "host/api_call.h"
+
+#include <exception>
+#include <memory>
+#include <sstream>
+
+#include "platform/webapi/api_request.h"
+#include "platform/webapi/api_response.h"
+
+bool IsHostOnlyParameter(const std::string& name) {
+  static const std::string kSuffix = "_tmp";
+  return name.size() >= kSuffix.size() &&
+         name.compare(name.size() - kSuffix.size(), kSuffix.size(), kSuffix) == 0;
+}
+
+CallOutcome HostFailure(int status) {
+  CallOutcome outcome;
+  outcome.http_status = status;
+  outcome.answer = ORVA::HostErrorJson(status);
+  return outcome;
+}
+
+CallOutcome CallApi(const ORVA::APIEntry* table, const std::string& api,
+                    const std::string& method, int version,
+                    const Json::Value& params) {
+  const ORVA::APIEntry* row = nullptr;
+  for (int i = 0; table != nullptr && i < kModuleApiCount; ++i) {
+    if (api == table[i].api && method == table[i].method &&
+        version == table[i].version) {
+      row = &table[i];
+      break;
+    }
+  }
+  if (row == nullptr) return HostFailure(404);
+
+  ORVA::APIRequest request(api, method, version, params);
+  ORVA::APIResponse response;
+  ORVA::DownloadCollector collector;
+  try {
+    row->handler(&request, &response);
+  } catch (const std::exception&) {
+    return HostFailure(500);
+  } catch (...) {
+    return HostFailure(500);
+  }
+
+  CallOutcome outcome;
+  outcome.httpd_restart = response.httpd_restart();
+  if (!response.output_enabled()) {
+    if (!collector.result().has_body) return HostFailure(500);
+    outcome.is_download = true;
+    outcome.success = true;
+    outcome.download = collector.result();
+    return outcome;
+  }
+  if (response.outcome() == ORVA::APIResponse::Outcome::kNone) {
+    return HostFailure(500);
+  }
+  outcome.success = response.outcome() == ORVA::APIResponse::Outcome::kSuccess;
+  outcome.answer = response.ToJson();
+  return outcome;
+}
+
+std::string ToOneLineJson(const Json::Value& value) {
+  Json::StreamWriterBuilder builder;
+  builder["indentation"] = "";
+  builder["emitUTF8"] = true;
+  return Json::writeString(builder, value);
+}
+
+std::string OfferedFileName(const ORVA::DownloadResult& download) {
+  for (const auto& header : download.headers) {
+    std::string name = header.first;
+    for (char& c : name) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
+    if (name != "content-disposition") continue;
+    std::string::size_type start = header.second.find("filename=\"");
+    if (start == std::string::npos) continue;
+    start += 10;
+    std::string::size_type end = header.second.find('"', start);
+    if (end == std::string::npos) continue;
+    std::string offered = header.second.substr(start, end - start);
+    offered = offered.substr(offered.rfind('/') == std::string::npos
+                                 ? 0
+                                 : offered.rfind('/') + 1);
+    if (offered == "." || offered == "..") return "";
+    return offered;
+  }
+  return "";
+}

@@ -1,0 +1,47 @@
+#ifndef ORVA_HOST_API_CALL_H_
+#define ORVA_HOST_API_CALL_H_
+
+#include <string>
+#include <vector>
+
+#include <json/json.h>
+
+#include "platform/webapi/api_download.h"
+#include "platform/webapi/api_table.h"
+
+// How the host answers one call. HTTP status 200 for every answer the
+// module gives; host-level failures use their HTTP status as the code.
+struct CallOutcome {
+  int http_status = 200;
+  bool success = false;
+  Json::Value answer;            // the JSON answer, unless this is a download
+  bool is_download = false;
+  ORVA::DownloadResult download;
+  bool httpd_restart = false;    // the handler asked for a web server restart
+};
+
+// Number of rows the certificate module's table holds.
+inline constexpr int kModuleApiCount = 7;
+
+// True for a parameter name that only the host may set ("..._tmp"): these
+// name files on the device.
+bool IsHostOnlyParameter(const std::string& name);
+
+// Calls the row of `table` (kModuleApiCount rows) matching api, version and
+// method with `params` (a JSON object of text values). Unknown rows answer
+// 404; a handler that throws or ends without any answer answers 500.
+CallOutcome CallApi(const ORVA::APIEntry* table, const std::string& api,
+                    const std::string& method, int version,
+                    const Json::Value& params);
+
+// A host-level failure with `status` as HTTP status and code.
+CallOutcome HostFailure(int status);
+
+// `value` as JSON text on one line.
+std::string ToOneLineJson(const Json::Value& value);
+
+// The file name offered by a content-disposition header value, reduced to a
+// plain base name; "" when none.
+std::string OfferedFileName(const ORVA::DownloadResult& download);
+
+#endif  // ORVA_HOST_API_CALL_H_

@@ -1,0 +1,16 @@
+#ifndef ORVA_HOST_DEVICE_ROOT_INIT_H_
+#define ORVA_HOST_DEVICE_ROOT_INIT_H_
+
+#include <string>
+
+// Provisions a device root at `root` (made when missing): the tool links in
+// usr/orva/bin, an empty certificate store, the system configuration, the
+// service and plug-in folders, the host's access token (mode 0600) and the
+// MAC address file. Never overwrites what exists. Returns true on success;
+// false with a message in *error, leaving what was made so far.
+bool InitDeviceRoot(const std::string& root, std::string* error);
+
+// Path of the host's access token inside the device root `root`.
+std::string TokenPath(const std::string& root);
+
+#endif  // ORVA_HOST_DEVICE_ROOT_INIT_H_

@@ -1,0 +1,28 @@
+#ifndef ORVA_PLATFORM_WEBAPI_PARAMETER_CHECKER_H_
+#define ORVA_PLATFORM_WEBAPI_PARAMETER_CHECKER_H_
+
+#include <json/json.h>
+
+#include "platform/webapi/api_request.h"
+
+// Checks a request's parameters against a rule set
+// {"field": {NAME: {"type": CODE, "necessary": BOOL}}}.
+//
+// Type codes:
+//   4  text: the value must be a JSON string.
+//   8  JSON array: an array, or a string holding one, which is parsed and
+//      stored in the request in its place.
+//   14 whole number fitting a 32-bit signed integer: a JSON integer, or a
+//      string of decimal digits with an optional leading minus sign, which
+//      is converted and stored in its place.
+// Any other code fails the check.
+class ParameterChecker {
+ public:
+  // True when every rule holds: each necessary parameter is present and
+  // each present parameter that has a rule is of its kind. A malformed rule
+  // set fails. Conversions are made in `request` as the check goes; a
+  // failing check may leave earlier parameters converted.
+  static bool check(ORVA::APIRequest* request, const Json::Value& rules);
+};
+
+#endif  // ORVA_PLATFORM_WEBAPI_PARAMETER_CHECKER_H_

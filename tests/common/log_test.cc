@@ -1,0 +1,28 @@
+#include <gtest/gtest.h>
+
+#include "common/log.h"
+#include "platform/olib/olib_error.h"
+#include "tests/support/test_support.h"
+
+TEST(Log, PrefixesFileBaseNameAndLine) {
+  LogCapture log;
+  int line = __LINE__ + 1;
+  ORVA_LOG("Key is not existed");
+  EXPECT_TRUE(log.Contains("log_test.cc:" + std::to_string(line) + " Key is not existed\n"))
+      << log.Text();
+}
+
+TEST(Log, AppendsTheSystemLibraryLastError) {
+  OLIBCErrSet(0x2A, "/src/olib/olib_file.cc", 77);
+  LogCapture log;
+  ORVA_LOG_LASTERR("Open %s failed", "/usr/orva/etc/ssl/cfg.d/ca.cfg");
+  EXPECT_TRUE(log.Contains(" Open /usr/orva/etc/ssl/cfg.d/ca.cfg failed[0x002A olib_file.cc:77]\n"))
+      << log.Text();
+}
+
+TEST(Log, ErrnoConversionSeesTheCallersErrno) {
+  LogCapture log;
+  errno = ENOENT;
+  ORVA_LOG("%s failed.(errno:%d/%m)", "mkdir", errno);
+  EXPECT_TRUE(log.Contains(" mkdir failed.(errno:2/No such file or directory)")) << log.Text();
+}
