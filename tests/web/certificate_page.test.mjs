@@ -143,7 +143,7 @@ test('asks for the access token once a session and again when it is refused', {
   await page.locator('#token-input').fill(server.token);
   await page.locator('#token-input').press('Enter');
   await page.locator('#empty-store').waitFor({ timeout: WAIT_MS });
-  const emptyText = await page.locator('#empty-store').textContent();
+  const emptyText = await page.locator('#empty-store').innerText();
   assert.match(emptyText, /No certificate is installed/);
   assert.match(emptyText, /Create a local certificate authority/);
   assert.match(emptyText, /Import a certificate/);
