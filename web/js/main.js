@@ -64,14 +64,15 @@ async function refreshTable(retries = 0) {
 // Called after a new certificate is installed: tells what restarted and
 // shows the new table. Returns the sentence for the form.
 function installed(data) {
+  pageNotice.hidden = true;
   if (data?.restart_httpd === true) {
     pageNotice.textContent = 'The management web server is restarting with the new ' +
       'certificate. If the page stops answering, wait a moment and reload it; the browser ' +
       'may ask you to trust the new certificate.';
     pageNotice.hidden = false;
     sleep(RESTART_RETRY_DELAY_MS).then(() => refreshTable(RESTART_RETRIES));
-    return 'The device’s secure services restarted with it, and so does the management ' +
-      'web server.';
+    return 'The device’s secure services restarted with it, and the management web server ' +
+      'is restarting with it too.';
   }
   refreshTable();
   return 'The device’s secure services restarted with it.';
