@@ -45,8 +45,8 @@ async function exists(file) {
 
 // Opens the page with a device of its own, enters the token and waits for
 // the first table.
-async function signedIn(t, { prepare, viewport } = {}) {
-  const server = await startDeviceServer(t, { prepare });
+async function signedIn(t, { prepare, https, viewport } = {}) {
+  const server = await startDeviceServer(t, { prepare, https });
   const { page, consoleErrors } = await openBrowser(t, viewport);
   await page.goto(server.url);
   await page.locator('#token-input').fill(server.token);
@@ -163,10 +163,18 @@ test('asks for the access token once a session and again when it is refused', {
   for (const error of consoleErrors) assert.match(error, /status of 401/);
 });
 
+// The management web server serves HTTPS too, so a new certificate restarts it.
+async function withHttps(root) {
+  const conf = path.join(root, 'usr/orva/etc/orva.conf');
+  const text = await readFile(conf, 'utf8');
+  assert.match(text, /runHTTPS="no"/);
+  await writeFile(conf, text.replace('runHTTPS="no"', 'runHTTPS="yes"'));
+}
+
 test('creates a local CA and server certificate with the keyboard alone, then lists both', {
   timeout: TEST_TIMEOUT_MS,
 }, async (t) => {
-  const { page, consoleErrors } = await signedIn(t);
+  const { page, consoleErrors } = await signedIn(t, { prepare: withHttps, https: true });
   const creates = [];
   page.on('request', (request) => {
     if ((request.postData() || '').includes('api=ORVA.Core.Certificate.CRT')) creates.push(request);
@@ -209,6 +217,8 @@ test('creates a local CA and server certificate with the keyboard alone, then li
   const outcome = await formOutcome(page, 'crt-create');
   assert.equal(outcome.tone, 'success', outcome.text);
   assert.match(outcome.text, /installed/);
+  assert.match(outcome.text, /management web server is restarting/);
+  assert.match(await page.locator('#page-notice').textContent(), /reload it/);
   assert.equal(creates.length, 1, 'a busy form is not sent again');
   assert.equal(await button.getAttribute('aria-disabled'), 'false');
   assert.equal(await button.textContent(), 'Create and install');

@@ -67,9 +67,10 @@ export async function callMethod(root, api, method, params = {}) {
 }
 
 // Starts a server for test `t` and registers its stop with t.after.
-// `prepare(root)` runs after init and before the server starts.
+// `prepare(root)` runs after init and before the server starts; with `https`
+// the server also gets a free port for its HTTPS listener.
 // Resolves with { url, token, root, log() }.
-export async function startDeviceServer(t, { prepare } = {}) {
+export async function startDeviceServer(t, { prepare, https = false } = {}) {
   if (!HOST_BINARY || !WEB_DIR) throw new Error('ORVA_WEBAPI and ORVA_WEB_DIR must be set');
   const scratch = await mkdtemp(path.join(os.tmpdir(), 'orva-web-test-'));
   let child = null;
@@ -92,9 +93,9 @@ export async function startDeviceServer(t, { prepare } = {}) {
   const port = await freePort();
   const url = `http://127.0.0.1:${port}/`;
   let output = '';
-  child = spawn(HOST_BINARY,
-    ['serve', '--root', root, '--listen', `127.0.0.1:${port}`, '--web', WEB_DIR],
-    { stdio: ['ignore', 'pipe', 'pipe'] });
+  const args = ['serve', '--root', root, '--listen', `127.0.0.1:${port}`, '--web', WEB_DIR];
+  if (https) args.push('--listen-https', `127.0.0.1:${await freePort()}`);
+  child = spawn(HOST_BINARY, args, { stdio: ['ignore', 'pipe', 'pipe'] });
   child.stdout.on('data', (chunk) => { output += chunk; });
   child.stderr.on('data', (chunk) => { output += chunk; });
   const log = () => output;
