@@ -62,13 +62,12 @@ std::string AddressDigits(const std::string& address) {
 // Where the device's MAC address file is missing, the address of the
 // machine's first non-loopback interface (by name) stands in for it.
 bool ReadInterfaceAddress(std::string* word) {
-  DIR* directory = opendir(kNetworkInterfaces);
-  if (directory == nullptr) return false;
+  DirPtr directory(opendir(kNetworkInterfaces));
+  if (!directory) return false;
   std::vector<std::string> names;
-  while (struct dirent* entry = readdir(directory)) {
+  while (struct dirent* entry = readdir(directory.get())) {
     if (entry->d_name[0] != '.') names.push_back(entry->d_name);
   }
-  closedir(directory);
   std::sort(names.begin(), names.end());
   for (const std::string& name : names) {
     std::string base = std::string(kNetworkInterfaces) + "/" + name;

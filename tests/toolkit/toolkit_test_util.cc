@@ -52,14 +52,13 @@ std::string CertificateText(const std::string& path) {
 
 std::string TemporaryFilesIn(const std::string& directory) {
   std::string names;
-  DIR* dir = opendir(directory.c_str());
-  if (dir == nullptr) return names;
-  while (struct dirent* entry = readdir(dir)) {
+  DirPtr dir(opendir(directory.c_str()));
+  if (!dir) return names;
+  while (struct dirent* entry = readdir(dir.get())) {
     if (std::string(entry->d_name).find(".tmp") != std::string::npos) {
       names += std::string(entry->d_name) + " ";
     }
   }
-  closedir(dir);
   return names;
 }
 
