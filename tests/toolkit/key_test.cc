@@ -10,7 +10,8 @@
 
 namespace {
 const std::string kKey = "/usr/orva/etc/ssl/ssl.key/server.key";
-// Script lines that write something to the file named after "-out".
+// Script lines that write the file named after "-out" as the tool would,
+// failing when it cannot be written.
 const std::string kWriteOutputFile =
     "for arg; do\n"
     "  if [ \"$previous\" = -out ]; then echo key > \"$arg\" || exit 1; fi\n"
@@ -30,7 +31,7 @@ TEST(GenDir, MakesParentsAndRefusesEmptyPaths) {
   EXPECT_TRUE(log.Contains(" genDir sanity check failed\n")) << log.Text();
 }
 
-TEST(GenKey, MakesReadOnlyKeyInNewDirectoryAndReplacesOldOne) {
+TEST(GenKey, MakesReadOnlyKeyReplacingTheOldOne) {
   TempDeviceRoot root;
   root.WriteFile(kKey, "old key\n", 0644);
   ASSERT_EQ(0, genKey(root.Path(kKey).c_str(), 1024));
