@@ -52,6 +52,18 @@ int genKey(const char* keyPath, unsigned int bits);
 int genCsr(const char* configPath, const char* keyPath,
            const char* requestPath, CSR_ARGUMENT* subject);
 
+// The subject rules of genCsr, checked alone so a caller can refuse a
+// subject before it writes anything: 0 when `subject` is acceptable; -2
+// (logged as genCsr logs it) for a null subject, a country that is not
+// exactly 2 bytes, or a value holding a control character.
+int checkCsrSubject(const CSR_ARGUMENT* subject);
+
+// The alias rules of the server extension file, checked alone: 0 when every
+// non-empty name of the ";"-separated `aliases` (null counts as empty) is
+// an IPv4 or IPv6 literal or made of letters, digits, ".", "-", "_" and
+// "*"; -1 (logged with the name's position) otherwise.
+int checkAliasText(const char* aliases);
+
 // Writes the CA serial file "/usr/orva/etc/ssl/.mkcert.serial": the time in
 // seconds, then the MAC address word from its ninth character on, cut to 31
 // characters and padded with "1" to an even length. The MAC address comes

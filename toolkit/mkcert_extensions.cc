@@ -44,6 +44,12 @@ bool IsHostName(const char* name) {
   return true;
 }
 
+// True when `name` may stand in the alternative names (empty names are
+// skipped and count as allowed).
+bool IsAllowedAlias(const char* name) {
+  return *name == '\0' || IsAddressLiteral(name) || IsHostName(name);
+}
+
 // The subjectAltName entries for the names of `aliases`, empty names
 // skipped. False (logged) when a name is neither an address literal nor a
 // host name.
@@ -51,11 +57,11 @@ bool AliasEntries(const OLIBSZLIST* aliases, std::string* entries) {
   for (uint32_t i = 0; i < aliases->nItem; ++i) {
     const char* name = OLIBCSzListGet(aliases, i);
     if (*name == '\0') continue;
-    bool address = IsAddressLiteral(name);
-    if (!address && !IsHostName(name)) {
+    if (!IsAllowedAlias(name)) {
       ORVA_LOG("Alias %u is neither a host name nor an IP address", i + 1);
       return false;
     }
+    bool address = IsAddressLiteral(name);
     if (!entries->empty()) *entries += ", ";
     *entries += address ? "IP:" : "DNS:";
     *entries += name;
@@ -105,4 +111,27 @@ int generateServerCNF(const char* path, OLIBSZLIST* aliases) {
   std::string text = kServerExtensions;
   if (!entries.empty()) text += "subjectAltName = \"" + entries + "\"\n";
   return WriteExtensionFile(path, text);
+}
+
+int checkAliasText(const char* aliases) {
+  if (aliases == nullptr) return 0;
+  OLIBSZLIST* list = OLIBCSzListAlloc(512);
+  if (list == nullptr) {
+    ORVA_LOG("Out of memory!! size=512");
+    return -1;
+  }
+  // OLIBCStrSep may move the list; ownership is taken back from `list`.
+  int separated = OLIBCStrSep(aliases, ";", &list);
+  OLIBSzListPtr owner(list);
+  if (separated == -1) {
+    ORVA_LOG("String separate failed.");
+    return -1;
+  }
+  for (uint32_t i = 0; i < owner->nItem; ++i) {
+    if (!IsAllowedAlias(OLIBCSzListGet(owner.get(), i))) {
+      ORVA_LOG("Alias %u is neither a host name nor an IP address", i + 1);
+      return -1;
+    }
+  }
+  return 0;
 }

@@ -11,8 +11,8 @@
 
 // What the toolkit's source files share and nobody else needs.
 
-// Every toolkit command line is built in a buffer of this many bytes,
-// terminating zero included.
+// Every toolkit command line fits this many bytes on the device,
+// terminating zero included (see RootedCommandSize for other roots).
 inline constexpr size_t kToolkitCommandSize = 512;
 
 // The openssl tool of the device, under the device root.

@@ -44,7 +44,7 @@ int genDir(const char* path) {
     return -1;
   }
   std::string copy(path);
-  ShellCommand command(kToolkitCommandSize);
+  ShellCommand command(RootedCommandSize(kToolkitCommandSize));
   command.Append("mkdir -p %s", {dirname(&copy[0])});
   return RunShellCommand(command) == 0 ? 0 : -1;
 }
@@ -63,7 +63,7 @@ int genKey(const char* keyPath, unsigned int bits) {
   if (!key.ok()) return -1;
 
   std::string seeds = ExistingSeedFiles();
-  ShellCommand command(kToolkitCommandSize);
+  ShellCommand command(RootedCommandSize(kToolkitCommandSize));
   if (seeds.empty()) {
     command.Append("%s genrsa -out %s %d >/dev/null 2>&1",
                    {OpensslTool(), key.temporary(), bits});

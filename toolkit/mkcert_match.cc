@@ -30,7 +30,7 @@ constexpr char kKeyDigest[] =
 // The first output line of the digest pipeline `format` for `path`, in
 // `line`. 1 when read, 0 otherwise.
 int DigestLine(const char* format, const char* path, char* line) {
-  ShellCommand command(kToolkitCommandSize);
+  ShellCommand command(RootedCommandSize(kToolkitCommandSize));
   command.Append(format, {OpensslTool(), path, OpensslTool()});
   return getMd5(line, kDigestLineSize, command);
 }

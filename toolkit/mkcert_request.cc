@@ -65,6 +65,9 @@ std::string RequestConfig(const CSR_ARGUMENT& subject) {
   text += ConfigLine("default_bits", "1024");
   text += ConfigLine("distinguished_name", "req_DN");
   text += ConfigLine("prompt", "no");
+  // Values are UTF-8 text; without this the tool takes each byte for a
+  // character and "Zürich" arrives double-encoded.
+  text += ConfigLine("utf8", "yes");
   text += "[ req_DN ]\n";
   for (const SubjectLine& line : kSubjectLines) {
     const std::string& value = subject.*line.member;
@@ -92,17 +95,7 @@ int modifyCsrCfg(const char* configPath, const CSR_ARGUMENT& subject) {
 
 }  // namespace
 
-int genCsr(const char* configPath, const char* keyPath,
-           const char* requestPath, CSR_ARGUMENT* subject) {
-  if (configPath == nullptr || *configPath == '\0' || keyPath == nullptr ||
-      *keyPath == '\0' || requestPath == nullptr || *requestPath == '\0') {
-    ORVA_LOG("genCsr sanity failed");
-    return -1;
-  }
-  if (OLIBCFileExist(keyPath) == 0) {
-    ORVA_LOG("Key is not existed");
-    return -1;
-  }
+int checkCsrSubject(const CSR_ARGUMENT* subject) {
   if (subject == nullptr) {
     ORVA_LOG_LASTERR("CSR Argument error");
     return -2;
@@ -116,6 +109,21 @@ int genCsr(const char* configPath, const char* keyPath,
     ORVA_LOG_LASTERR("CSR Argument error");
     return -2;
   }
+  return 0;
+}
+
+int genCsr(const char* configPath, const char* keyPath,
+           const char* requestPath, CSR_ARGUMENT* subject) {
+  if (configPath == nullptr || *configPath == '\0' || keyPath == nullptr ||
+      *keyPath == '\0' || requestPath == nullptr || *requestPath == '\0') {
+    ORVA_LOG("genCsr sanity failed");
+    return -1;
+  }
+  if (OLIBCFileExist(keyPath) == 0) {
+    ORVA_LOG("Key is not existed");
+    return -1;
+  }
+  if (checkCsrSubject(subject) != 0) return -2;
   if (genDir(requestPath) != 0) {
     ORVA_LOG("generate directory failed");
     return -1;
@@ -124,7 +132,7 @@ int genCsr(const char* configPath, const char* keyPath,
 
   PendingStoreFile request(requestPath);
   if (!request.ok()) return -1;
-  ShellCommand command(kToolkitCommandSize);
+  ShellCommand command(RootedCommandSize(kToolkitCommandSize));
   command.Append(
       "%s req -config %s -new -sha256 -key %s -out %s >/dev/null 2>&1",
       {OpensslTool(), configPath, keyPath, request.temporary()});

@@ -75,7 +75,7 @@ int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,
 
   PendingStoreFile certificate(output);
   if (!certificate.ok()) return -1;
-  ShellCommand command(kToolkitCommandSize);
+  ShellCommand command(RootedCommandSize(kToolkitCommandSize));
   command.Append("%s x509 -extfile %s -days %d -in %s -req -sha256 -out %s",
                  {OpensslTool(), extFile, days, requestPath,
                   certificate.temporary()});

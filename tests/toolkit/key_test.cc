@@ -88,9 +88,10 @@ TEST(GenKey, HandsOnlyExistingSeedFilesToTheTool) {
 
 TEST(GenKey, CommandLineThatDoesNotFitIsRefused) {
   TempDeviceRoot root;
-  std::string folder = root.Path("/" + std::string(200, 'a') + "/" +
-                                 std::string(200, 'b') + "/" +
-                                 std::string(100, 'c'));
+  std::string folder = root.Path("/" + std::string(250, 'a') + "/" +
+                                 std::string(250, 'b') + "/" +
+                                 std::string(250, 'c') + "/" +
+                                 std::string(250, 'd'));
   LogCapture log;
   EXPECT_EQ(-1, genKey((folder + "/k.key").c_str(), 1024));
   EXPECT_TRUE(log.Contains("does not fit")) << log.Text();

@@ -61,6 +61,7 @@ TEST_F(GenCsrTest, WritesTheConfigurationAndAReadOnlyRequest) {
       "default_bits                    = 1024\n"
       "distinguished_name              = req_DN\n"
       "prompt                          = no\n"
+      "utf8                            = yes\n"
       "[ req_DN ]\n"
       "countryName                     = 'TW'\n"
       "stateOrProvinceName             = 'Taipei'\n"
@@ -78,7 +79,7 @@ TEST_F(GenCsrTest, WritesTheConfigurationAndAReadOnlyRequest) {
   country_only.country = "DE";
   ASSERT_EQ(0, Run(&country_only));
   std::string config = ReadFile(root_.Path(kConfig));
-  EXPECT_EQ(6, std::count(config.begin(), config.end(), '\n')) << config;
+  EXPECT_EQ(7, std::count(config.begin(), config.end(), '\n')) << config;
   EXPECT_NE(std::string::npos, config.find("\n[ req_DN ]\ncountryName"));
   EXPECT_EQ("", RequestSubject(NID_commonName));
   EXPECT_EQ("", TemporaryFilesIn(root_.Path("/usr/orva/etc/ssl/.gen")));
@@ -89,7 +90,9 @@ TEST_F(GenCsrTest, QuotesAndBackslashesArriveIntact) {
   subject.organization = "O'Reilly \\ $HOME #1 \"x\"";
   subject.department = "ends with \\";
   subject.common_name = "'";
+  subject.city = "Z\xC3\xBCrich";
   ASSERT_EQ(0, Run(&subject));
+  EXPECT_EQ(subject.city, RequestSubject(NID_localityName)) << "UTF-8 stays UTF-8";
   EXPECT_EQ(subject.organization, RequestSubject(NID_organizationName));
   EXPECT_EQ(subject.department, RequestSubject(NID_organizationalUnitName));
   EXPECT_EQ(subject.common_name, RequestSubject(NID_commonName));
