@@ -5,6 +5,7 @@
 
 #include "common/api_errors.h"
 #include "platform/webapi/parameter_checker.h"
+#include "upload/uploadsslca.h"
 
 namespace {
 
@@ -59,9 +60,10 @@ void doCertificateList_v1(ORVA::APIRequest* request,
 
 void doCertificateExport_v1(ORVA::APIRequest* request,
                             ORVA::APIResponse* response) {
+  SSLCAFormHandler handler;
   CheckThen(request, response, {{"file", kTextRule, true}},
-            [](ORVA::APIRequest*, ORVA::APIResponse* answer) {
-              answer->SetError(kErrFailed, Json::Value());
+            [&handler](ORVA::APIRequest* checked, ORVA::APIResponse* answer) {
+              handler.DownloadAction(checked, answer);
             });
 }
 
