@@ -1,6 +1,7 @@
 #ifndef ORVA_COMMON_RAII_H_
 #define ORVA_COMMON_RAII_H_
 
+#include <dirent.h>
 #include <openssl/bio.h>
 #include <openssl/evp.h>
 #include <openssl/x509.h>
@@ -29,5 +30,10 @@ struct BioDeleter {
   void operator()(BIO* bio) const { BIO_free(bio); }
 };
 using BioPtr = std::unique_ptr<BIO, BioDeleter>;
+
+struct DirCloser {
+  void operator()(DIR* directory) const { closedir(directory); }
+};
+using DirPtr = std::unique_ptr<DIR, DirCloser>;
 
 #endif  // ORVA_COMMON_RAII_H_

@@ -1,0 +1,28 @@
+#ifndef ORVA_TOOLKIT_MKCERT_INTERNAL_H_
+#define ORVA_TOOLKIT_MKCERT_INTERNAL_H_
+
+#include <sys/wait.h>
+
+#include <cstddef>
+#include <string>
+
+#include "common/store_paths.h"
+#include "platform/olib/orva_root.h"
+
+// What the toolkit's source files share and nobody else needs.
+
+// Every toolkit command line is built in a buffer of this many bytes,
+// terminating zero included.
+inline constexpr size_t kToolkitCommandSize = 512;
+
+// The openssl tool of the device, under the device root.
+inline std::string OpensslTool() { return OrvaPath(kOpensslTool); }
+
+// Reading of a tool run that writes a key or certificate: it succeeded only
+// when it ended by itself with exit code 0. A tool killed by a signal has
+// exit code 0 in its status word yet may have left half a file.
+inline bool ToolExitedCleanly(int status) {
+  return status != -1 && WIFEXITED(status) && WEXITSTATUS(status) == 0;
+}
+
+#endif  // ORVA_TOOLKIT_MKCERT_INTERNAL_H_
