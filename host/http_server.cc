@@ -38,6 +38,9 @@ void WebapiService::Install(httplib::Server* server) {
   server->set_read_timeout(kReadTimeoutSeconds);
   server->set_write_timeout(kWriteTimeoutSeconds);
   server->set_keep_alive_timeout(kKeepAliveTimeoutSeconds);
+  // Headers and body go out in separate writes; without this, a client on
+  // a kept-alive connection waits for a delayed acknowledgement per answer.
+  server->set_tcp_nodelay(true);
 
   server->set_pre_routing_handler(
       [this](const Request& request, Response& response) {
