@@ -1,4 +1,3 @@
-#include <sys/stat.h>
 
 #include <chrono>
 #include <cstdlib>
@@ -185,31 +184,6 @@ TEST(RequestParsing, RefusesMalformedRequestsBeforeSavingAnything) {
     EXPECT_EQ(c.status, ParseWebapiRequest(request, &uploads, &call));
     EXPECT_EQ(0, CountFiles(folder.path())) << "nothing saved before the refusal";
   }
-}
-
-TEST(RequestParsing, SavesUploadsPrivatelyUnderHostNamesUntilTheCallEnds) {
-  TempDeviceRoot scratch;
-  UploadFolder folder(scratch.Path("/uploads"));
-  const std::string content("-----BEGIN\0binary\xff", 17);
-  httplib::Request request;
-  request.params.emplace("api", "A");
-  request.params.emplace("method", "m");
-  request.params.emplace("version", "2");
-  request.files.emplace("cert", Part("cert", content, "../../etc/passwd", "text/plain"));
-  std::string saved;
-  {
-    TemporaryUploads uploads;
-    WebapiCall call;
-    ASSERT_EQ(0, ParseWebapiRequest(request, &uploads, &call));
-    EXPECT_EQ(2, call.version);
-    EXPECT_EQ("../../etc/passwd", call.params["cert"].asString());
-    saved = call.params["cert_tmp"].asString();
-    EXPECT_EQ(folder.path() + "/", saved.substr(0, folder.path().size() + 1));
-    EXPECT_EQ(content, ReadFile(saved));
-    EXPECT_EQ(0600, FileMode(saved));
-  }
-  EXPECT_FALSE(FileExists(saved));
-  EXPECT_EQ(0, CountFiles(folder.path()));
 }
 
 TEST(CallOrder, ListCallsShareTheLockButQueueBehindAWaitingWriter) {
