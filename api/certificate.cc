@@ -5,6 +5,7 @@
 
 #include "common/api_errors.h"
 #include "platform/webapi/parameter_checker.h"
+#include "upload/uploadsslca.h"
 
 namespace {
 
@@ -59,20 +60,22 @@ void doCertificateList_v1(ORVA::APIRequest* request,
 
 void doCertificateExport_v1(ORVA::APIRequest* request,
                             ORVA::APIResponse* response) {
+  SSLCAFormHandler handler;
   CheckThen(request, response, {{"file", kTextRule, true}},
-            [](ORVA::APIRequest*, ORVA::APIResponse* answer) {
-              answer->SetError(kErrFailed, Json::Value());
+            [&handler](ORVA::APIRequest* checked, ORVA::APIResponse* answer) {
+              handler.DownloadAction(checked, answer);
             });
 }
 
 void doCertificateImport_v1(ORVA::APIRequest* request,
                             ORVA::APIResponse* response) {
+  SSLCAFormHandler handler;
   CheckThen(request, response,
             {{"cert_tmp", kTextRule, true},
              {"key_tmp", kTextRule, true},
              {"inter_cert_tmp", kTextRule, false}},
-            [](ORVA::APIRequest*, ORVA::APIResponse* answer) {
-              answer->SetError(kErrFailed, Json::Value());
+            [&handler](ORVA::APIRequest* checked, ORVA::APIResponse* answer) {
+              handler.ProcessJsonReq(checked, answer);
             });
 }
 

@@ -1,6 +1,7 @@
 #ifndef ORVA_COMMON_RAII_H_
 #define ORVA_COMMON_RAII_H_
 
+#include <dirent.h>
 #include <openssl/bio.h>
 #include <openssl/evp.h>
 #include <openssl/x509.h>
@@ -29,5 +30,16 @@ struct BioDeleter {
   void operator()(BIO* bio) const { BIO_free(bio); }
 };
 using BioPtr = std::unique_ptr<BIO, BioDeleter>;
+
+struct DirCloser {
+  void operator()(DIR* directory) const { closedir(directory); }
+};
+using DirPtr = std::unique_ptr<DIR, DirCloser>;
+
+// A stack of certificates that owns them: all are freed with the stack.
+struct X509StackDeleter {
+  void operator()(STACK_OF(X509)* stack) const { sk_X509_pop_free(stack, X509_free); }
+};
+using X509StackPtr = std::unique_ptr<STACK_OF(X509), X509StackDeleter>;
 
 #endif  // ORVA_COMMON_RAII_H_

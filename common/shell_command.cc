@@ -6,6 +6,7 @@
 
 #include "common/log.h"
 #include "platform/olib/olib_process.h"
+#include "platform/olib/orva_root.h"
 
 ShellCommand::ShellCommand(size_t capacity) : buffer_(capacity > 0 ? capacity : 1, '\0') {}
 
@@ -63,6 +64,11 @@ bool ShellCommand::Append(const char* format,
   Put(literal, static_cast<size_t>(p - literal));
   if (next != args.end()) fits_ = false;
   return fits_;
+}
+
+size_t RootedCommandSize(size_t deviceSize) {
+  size_t root_prefix = OrvaPath("/").size() - 1;
+  return deviceSize + kMaxRootedPaths * root_prefix;
 }
 
 namespace {

@@ -65,6 +65,13 @@ class ShellCommand {
   bool fits_ = true;
 };
 
+// Buffer size for a command line that takes `deviceSize` bytes on the
+// device itself, where the device root is "/": adds room for the root
+// prefix of every path such a line can hold (at most kMaxRootedPaths), so a
+// test or development root does not make a sound line too long.
+inline constexpr size_t kMaxRootedPaths = 8;
+size_t RootedCommandSize(size_t deviceSize);
+
 // Runs `command` with /bin/sh -c and waits for it. Returns the raw wait
 // status as `system` does (read it with WEXITSTATUS or as a whole), or -1
 // when the command did not fit (logged; nothing runs) or the shell could not

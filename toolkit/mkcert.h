@@ -6,18 +6,22 @@
 
 #include "api/csr_argument.h"
 #include "common/raii.h"
+#include "common/shell_command.h"
 #include "platform/olib/olib_szlist.h"
 #include "platform/olib/olib_types.h"
 
 // The certificate toolkit: keys, requests and certificates made with the
 // device's openssl tool, key/certificate matching and chain verification.
-// It returns integers and logs; it never answers a web request.
+// It returns integers and logs every failure; it never answers a web
+// request.
 //
 // Every path argument is a real path (callers place fixed device paths
-// under the device root with OrvaPath). Files the toolkit writes are
-// written under a temporary name beside the target, given mode 0400 and
-// renamed over the target only when complete: on failure the earlier file
-// stays as it was.
+// under the device root with OrvaPath) and reaches the tool quoted, whatever
+// it holds. Keys, requests and certificates are written by the tool under a
+// temporary name beside the target, given mode 0400 and renamed over the
+// target only when complete: on failure the earlier file stays as it was
+// and no temporary file is left. Configuration and extension files are
+// rewritten in place; directories made on the way stay.
 
 // Key algorithm named by the first line of a private-key file.
 typedef enum __tag_CYPHER {
@@ -26,75 +30,118 @@ typedef enum __tag_CYPHER {
   CYPHER_DSA = 2,
 } CYPHER;
 
-// Makes sure the directory that will hold `path` exists (with parents).
-// 0 on success; -1 when the path is null or empty or the directory cannot be
-// made.
+// Makes sure the directory that will hold the file `path` exists (with its
+// parents; "." for a path without a slash). 0 on success; -1 when the path
+// is null or empty (logged) or the directory cannot be made.
 int genDir(const char* path);
 
-// Makes a new RSA key of `bits` bits at `keyPath`, mode 0400. 0 on success;
-// -1 (logged) on failure, a size of 0 or above 16384 included.
+// Makes a new RSA key of `bits` bits at `keyPath`, mode 0400, replacing an
+// existing file even when it is read-only. 0 on success; -1 (logged) for a
+// null or empty path, a size of 0 or above 16384, a directory that cannot
+// be made, or a tool failure.
 int genKey(const char* keyPath, unsigned int bits);
 
 // Writes the request configuration at `configPath` from `subject` and makes
 // a request for the existing key `keyPath` at `requestPath` (mode 0400).
-// 0 on success; -1 for a missing path or key, a directory, configuration
-// or tool failure; -2 for a null subject, a country that is not exactly 2
-// bytes, or a value holding a control character (nothing written then).
+// Subject values arrive in the request exactly as they stand.
+// 0 on success; -1 (logged) for a missing path or key, a directory,
+// configuration or tool failure; -2 (logged) for a null subject, a country
+// that is not exactly 2 bytes, or a value holding a control character
+// (below 0x20, or 0x7F). The key is tested before the subject; on -2
+// nothing is written.
 int genCsr(const char* configPath, const char* keyPath,
            const char* requestPath, CSR_ARGUMENT* subject);
 
-// Writes the CA serial file from the time and the MAC address. 0 or -1.
+// The subject rules of genCsr, checked alone so a caller can refuse a
+// subject before it writes anything: 0 when `subject` is acceptable; -2
+// (logged as genCsr logs it) for a null subject, a country that is not
+// exactly 2 bytes, or a value holding a control character.
+int checkCsrSubject(const CSR_ARGUMENT* subject);
+
+// The alias rules of the server extension file, checked alone: 0 when every
+// non-empty name of the ";"-separated `aliases` (null counts as empty) is
+// an IPv4 or IPv6 literal or made of letters, digits, ".", "-", "_" and
+// "*"; -1 (logged with the name's position) otherwise.
+int checkAliasText(const char* aliases);
+
+// Writes the CA serial file "/usr/orva/etc/ssl/.mkcert.serial": the time in
+// seconds, then the MAC address word from its ninth character on, cut to 31
+// characters and padded with "1" to an even length. The MAC address comes
+// from "/proc/sys/kernel/orva_mac_address1", or where that is missing from
+// the machine's first non-loopback network interface. 0 on success; -1
+// (logged) when neither source can be read or the file cannot be written
+// (no file is left then).
 int genSerial();
 
-// Write the CA and server extension files. 0 or -1.
+// Write the CA and the server extension file at `path`, replacing its
+// content. The server file names every non-empty item of `aliases` as
+// "IP:" for an IPv4 or IPv6 literal and "DNS:" otherwise. 0 on success; -1
+// (logged) for a null or empty path, a null list, a name that is neither an
+// address literal nor made of letters, digits, ".", "-", "_" and "*"
+// (refused before anything is written), or a directory or file failure.
 int generateCACNF(const char* path);
 int generateServerCNF(const char* path, OLIBSZLIST* aliases);
 
-// Signs `requestPath`. Self-signed (`selfSigned` == TRUE): written to
-// `caOrOutput`, signed with `keyPath`, `serialPath` and `outputPath` unused.
-// CA-signed (any other value): signed by the CA certificate `caOrOutput` and
-// CA key `keyPath`, serial from `serialPath`, written to `outputPath`, with
-// the names of `aliases` (";"-separated; null counts as empty). 0 on
-// success with the certificate at mode 0400; -1 (logged) otherwise.
+// Signs `requestPath` for `days` days (above 0). Self-signed (`selfSigned`
+// == TRUE): written to `caOrOutput`, signed with `keyPath`, with the CA
+// extension file written at `extFile`; `serialPath`, `outputPath` and
+// `aliases` are unused. CA-signed (any other value): signed by the CA
+// certificate `caOrOutput` and CA key `keyPath`, serial from the existing
+// file `serialPath` (advanced by the tool), written to `outputPath`, with
+// the server extension file written at `extFile` from `aliases`
+// (";"-separated; null counts as empty). 0 on success with the certificate
+// at mode 0400; -1 (logged) otherwise. Checks run before anything is
+// written: arguments, request, key, then serial file and aliases.
 int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,
            const char* serialPath, const char* outputPath, const char* keyPath,
            BOOL selfSigned, int days, const char* aliases);
 
-// genCrt with the server extension file and the store's serial file (made
-// when absent).
+// genCrt, CA-signed, with the server extension file
+// "/usr/orva/etc/ssl/cfg.d/server.crt.cfg" and the serial file, which
+// genSerial makes when it is absent (-1 when that fails).
 int genServerCrtHelper(const char* requestPath, const char* caCertPath,
                        const char* outputPath, const char* caKeyPath, int days,
                        const char* aliases);
 // genServerCrtHelper with the store's local CA certificate and key.
 int genServerCrt(const char* requestPath, const char* outputPath, int days,
                  const char* aliases);
-// genCrt, self-signed, with the CA extension file.
+// genCrt, self-signed, with the CA extension file
+// "/usr/orva/etc/ssl/cfg.d/ca.crt.cfg".
 int genCACrtHelper(const char* requestPath, const char* outputPath,
                    const char* keyPath, int days);
 
-// Runs `command` and copies the first line of its output into `output`
-// (cut to `size`). 1 when a line was read, 0 otherwise.
-int getMd5(char* output, int size, const char* command);
+// Runs `command` and copies the first line of its output, line end
+// included, into `output` (cut to `size` bytes with the terminating zero).
+// 1 when a line was read, 0 (logged) when the command did not start, was
+// refused or printed nothing; `output` is untouched then.
+int getMd5(char* output, int size, const ShellCommand& command);
 
-// 0 when the key at `keyPath` belongs to the certificate at `certPath`;
-// 1 when not (or, for a key type other than CYPHER_RSA, when the key's
-// modulus could not be read); -1 when a byte order mark could not be
-// stripped, the certificate's modulus could not be read, or the key's could
-// not be read for CYPHER_RSA. Strips a leading UTF-8 byte order mark from
-// both files in place first.
+// 0 when the key at `keyPath` belongs to the certificate at `certPath`, by
+// the digests of their RSA moduli; 1 when not (or, for a key type other
+// than CYPHER_RSA, when the key shows no modulus); -1 (logged) when a byte
+// order mark could not be stripped, the certificate shows no modulus, or
+// the key shows none for CYPHER_RSA. A file whose modulus the tool does not
+// print never matches. Strips a leading UTF-8 byte order mark from both
+// files in place first (the key's only when the certificate's succeeded).
 int verifyCrtAndKey(const char* certPath, const char* keyPath, CYPHER keyType);
 
-// Makes the local CA: key (`bits`), request from `subject`, self-signed
+// Makes the local CA in the store: key (`bits`), request from `subject`
+// with the configuration "/usr/orva/etc/ssl/cfg.d/ca.cfg", self-signed
 // certificate for 3650 days, and proves the pair. 0 on success, otherwise
-// the result of the first failed step (-1, -2 for a refused subject, 1).
+// the result of the first failed step (-1; -2 for a refused subject; 1 for
+// a pair that does not match), logged. Earlier steps are not undone.
 int genCASet(CSR_ARGUMENT* subject, int bits);
 
-// Appends every certificate of the PEM file at `path` to `certificates`
-// (which owns them). 0 when the file was opened, -1 when not.
+// Appends every certificate of the PEM file at `path` to `certificates`,
+// which owns them; reading stops quietly at the first block that is not a
+// readable certificate, and an encrypted block is never asked a password
+// for. 0 when the file was opened (also when it held no certificate); -1
+// (logged) when not, `certificates` unchanged.
 int loadCrtList(const char* path, std::vector<X509Ptr>& certificates);
 
-// 0 when the certificates of both files form one issuing chain; 1 when not
-// or when neither file holds a certificate; -1 for a null, empty or absent
+// 0 when the certificates of both files form one issuing chain (all but one
+// issued another certificate of the set, in any order); 1 when not or when
+// neither file holds a certificate; -1 (logged) for a null, empty or absent
 // path or a file that cannot be opened.
 int verifyCrtChain(const char* certPath, const char* upperPath);
 

@@ -26,3 +26,15 @@ TEST(Log, ErrnoConversionSeesTheCallersErrno) {
   ORVA_LOG("%s failed.(errno:%d/%m)", "mkdir", errno);
   EXPECT_TRUE(log.Contains(" mkdir failed.(errno:2/No such file or directory)")) << log.Text();
 }
+
+TEST(Log, AsVariantNamesTheCallersFile) {
+  OLIBCErrSet(0x1001, "olib_plugin.cc", 12);
+  LogCapture log;
+  ORVA_LOG_AS("/src/upload/uploadsslca.cc", "Failed to restart %s", "FTP");
+  ORVA_LOG_LASTERR_AS("/src/upload/uploadsslca.cc", "Fail to do certificate plugin init ");
+  EXPECT_TRUE(log.Contains("uploadsslca.cc:")) << log.Text();
+  EXPECT_TRUE(log.Contains(" Failed to restart FTP\n")) << log.Text();
+  EXPECT_TRUE(log.Contains(" Fail to do certificate plugin init [0x1001 olib_plugin.cc:12]\n"))
+      << log.Text();
+  EXPECT_FALSE(log.Contains("log_test.cc")) << log.Text();
+}

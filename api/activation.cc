@@ -1,0 +1,82 @@
+#include "api/activation.h"
+
+#include <string>
+
+#include "common/log.h"
+#include "platform/olib/olib_service.h"
+
+namespace {
+
+// The plug-in action run for "certificate/change".
+constexpr int kPostAction = 5;
+
+bool IsYes(const OrvaConf& conf, const char* key) {
+  return conf.Info(key, "") == "yes";
+}
+
+void RestartIfEnabled(const char* service, const char* failure,
+                      const char* sourceFile) {
+  if (OLIBServiceIsEnabled(service) == 0) return;
+  if (OLIBServiceRestart(service) < 0) ORVA_LOG_AS(sourceFile, "%s", failure);
+}
+
+// "pagora" takes the place of "httpd-user" when it is enabled; "httpd-user"
+// is restarted without asking whether it is enabled.
+void RestartUserWebServer(const OrvaConf& conf, const char* sourceFile) {
+  if (!IsYes(conf, "runWebHTTPS")) return;
+  if (OLIBServiceIsEnabled("pagora") != 0) {
+    if (OLIBServiceRestart("pagora") < 0) {
+      ORVA_LOG_AS(sourceFile, "Failed to restart Pagora");
+    }
+  } else if (OLIBServiceRestart("httpd-user") < 0) {
+    ORVA_LOG_AS(sourceFile, "Failed to restart httpd user");
+  }
+}
+
+void NotifyPlugins(OLIBPLUGIN_HANDLE* handle, const char* sourceFile) {
+  if (OLIBPluginSDKInit("certificate", "certificate/change", handle) < 0) {
+    ORVA_LOG_LASTERR_AS(sourceFile, "Fail to do certificate plugin init ");
+  }
+  if (OLIBPluginHasInit(*handle) == 0 ||
+      OLIBPluginAction(kPostAction, *handle) < 0) {
+    ORVA_LOG_AS(sourceFile, "Fail to do post action for certificate plugin");
+  }
+  // A filled handle answers nonzero to OLIBPluginHasInit for as long as it
+  // lives, so it is released here, after its only use.
+  closePluginHandle(handle);
+}
+
+void AskHostRestart(ORVA::APIResponse* response, Json::Value& result,
+                    const OrvaConf& conf) {
+  if (!IsYes(conf, "runHTTPS")) return;
+  response->SetHttpdRestart(true);
+  result["restart_httpd"] = true;
+}
+
+}  // namespace
+
+void activateCertificate(ActivationSequence sequence,
+                         ORVA::APIResponse* response, Json::Value& result,
+                         const OrvaConf& conf, OLIBPLUGIN_HANDLE* handle,
+                         const char* sourceFile) {
+  if (sequence == kActivateAfterCreation) {
+    RestartIfEnabled("ftpd-ssl", "Failed to restart FTP", sourceFile);
+    RestartUserWebServer(conf, sourceFile);
+    RestartIfEnabled("webdav-httpd-ssl", "Failed to restart https WebDAV",
+                     sourceFile);
+    NotifyPlugins(handle, sourceFile);
+    AskHostRestart(response, result, conf);
+    return;
+  }
+  AskHostRestart(response, result, conf);
+  RestartIfEnabled("webdav-httpd-ssl", "Failed to restart https webdav",
+                   sourceFile);
+  RestartIfEnabled("ftpd-ssl", "Failed to restart service ftps", sourceFile);
+  RestartUserWebServer(conf, sourceFile);
+  NotifyPlugins(handle, sourceFile);
+}
+
+void closePluginHandle(OLIBPLUGIN_HANDLE* handle) {
+  OLIBPluginExit(*handle);
+  *handle = nullptr;
+}

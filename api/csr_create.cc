@@ -1,0 +1,22 @@
+#include "api/certificate.h"
+#include "api/csr_argument.h"
+#include "api/csr_generate.h"
+#include "api/request_values.h"
+#include "common/api_errors.h"
+#include "common/log.h"
+
+void handleCSRAction(ORVA::APIRequest* request, ORVA::APIResponse* response) {
+  CSR_ARGUMENT record;
+  if (fillCSRInfo(request, &record, false) == -1) {
+    ORVA_LOG("fill argument from json failed");
+    response->SetError(kErrFailed, Json::Value());
+    return;
+  }
+  int key_length = ReadKeyLength(request, "key_length");
+  if (generateCSR(key_length, record) == 0) {
+    ORVA_LOG_LASTERR("Generate csr from csr action failed");
+    response->SetError(kErrFailed, Json::Value());
+    return;
+  }
+  response->SetSuccess(Json::Value(Json::objectValue));
+}

@@ -1,0 +1,101 @@
+#include <openssl/evp.h>
+#include <openssl/pem.h>
+
+#include <cstdio>
+#include <string>
+
+#include "api/certificate.h"
+#include "api/certificate_info.h"
+#include "api/csr_argument.h"
+#include "api/csr_generate.h"
+#include "common/api_errors.h"
+#include "common/log.h"
+#include "common/pem_password.h"
+#include "common/raii.h"
+#include "common/store_paths.h"
+#include "platform/olib/orva_root.h"
+
+namespace {
+
+constexpr int kDefaultKeyLength = 2048;
+
+// The subject of the first "server_cert" entry of `info`, or null.
+Json::Value ServerSubject(const Json::Value& info) {
+  if (!info.isArray()) return Json::Value();
+  for (const Json::Value& entry : info) {
+    if (entry.isObject() && entry["type"].isString() &&
+        entry["type"].asString() == "server_cert") {
+      return entry["subject"];
+    }
+  }
+  return Json::Value();
+}
+
+void FillFromSubject(const Json::Value& subject, CSR_ARGUMENT* record) {
+  if (!subject.isObject()) return;
+  const struct {
+    const char* key;
+    std::string CSR_ARGUMENT::*member;
+  } kFields[] = {
+      {"common_name", &CSR_ARGUMENT::common_name},
+      {"country", &CSR_ARGUMENT::country},
+      {"email", &CSR_ARGUMENT::email},
+      {"city", &CSR_ARGUMENT::city},
+      {"organization", &CSR_ARGUMENT::organization},
+      {"department", &CSR_ARGUMENT::department},
+      {"state", &CSR_ARGUMENT::state},
+  };
+  for (const auto& field : kFields) {
+    const Json::Value& value = subject[field.key];
+    if (!value.isNull()) record->*field.member = value.asString();
+  }
+}
+
+// The key length of the first certificate of the installed server
+// certificate: the RSA modulus size, or 2048 for another key type.
+// Returns false (logged) when it cannot be read.
+bool InstalledKeyLength(int* bits) {
+  FilePtr file(std::fopen(OrvaPath(kServerCrtPath).c_str(), "r"));
+  if (!file) {
+    ORVA_LOG_LASTERR("open %s failed ", kServerCrtPath);
+    return false;
+  }
+  X509Ptr certificate(PEM_read_X509(file.get(), nullptr, RefusePemPassword, nullptr));
+  if (!certificate) {
+    ORVA_LOG_LASTERR("read x509 failed");
+    return false;
+  }
+  EvpPkeyPtr key(X509_get_pubkey(certificate.get()));
+  if (!key) {
+    ORVA_LOG_LASTERR("get public key from file failed");
+    return false;
+  }
+  *bits = EVP_PKEY_base_id(key.get()) == EVP_PKEY_RSA ? EVP_PKEY_get_bits(key.get())
+                                                      : kDefaultKeyLength;
+  return true;
+}
+
+}  // namespace
+
+void handleRenewAction(ORVA::APIRequest* request, ORVA::APIResponse* response) {
+  Json::Value info;
+  if (getCertificateInfo(OrvaPath(kServerCrtPath), info, request) != 0) {
+    ORVA_LOG("Get certificate info failed.%s", kServerCrtPath);
+    response->SetError(kErrFailed, Json::Value());
+    return;
+  }
+  CSR_ARGUMENT record;
+  FillFromSubject(ServerSubject(info), &record);
+  int key_length = 0;
+  if (!InstalledKeyLength(&key_length)) {
+    ORVA_LOG_LASTERR("Getting key length from %s failed", kServerCrtPath);
+    response->SetError(kErrFailed, Json::Value());
+    return;
+  }
+  if (generateCSR(key_length, record) == 0) {
+    ORVA_LOG_LASTERR("Generate csr from renew action failed");
+    response->SetError(kErrFailed, Json::Value());
+    return;
+  }
+  response->SetSuccess(Json::Value());
+}

@@ -1,0 +1,41 @@
+// The local certificate authority.
+
+#include <string>
+
+#include "common/log.h"
+#include "toolkit/mkcert.h"
+#include "toolkit/mkcert_internal.h"
+
+namespace {
+constexpr int kCaValidityDays = 3650;
+}  // namespace
+
+int genCASet(CSR_ARGUMENT* subject, int bits) {
+  const std::string key = OrvaPath(kCaKeyPath);
+  const std::string request = OrvaPath(kCaCsrPath);
+  const std::string certificate = OrvaPath(kCaCrtPath);
+
+  int result = genKey(key.c_str(), static_cast<unsigned int>(bits));
+  if (result != 0) {
+    ORVA_LOG("genCAKey() failed");
+    return result;
+  }
+  result = genCsr(OrvaPath(kCaCfgPath).c_str(), key.c_str(), request.c_str(),
+                  subject);
+  if (result != 0) {
+    ORVA_LOG("genCACsr() failed");
+    return result;
+  }
+  result = genCACrtHelper(request.c_str(), certificate.c_str(), key.c_str(),
+                          kCaValidityDays);
+  if (result != 0) {
+    ORVA_LOG("genCACrt() failed");
+    return result;
+  }
+  result = verifyCrtAndKey(certificate.c_str(), key.c_str(), CYPHER_RSA);
+  if (result != 0) {
+    ORVA_LOG("Root certificate and key is not matching");
+    return result;
+  }
+  return 0;
+}

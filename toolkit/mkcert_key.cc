@@ -1,0 +1,79 @@
+// Directories and RSA keys.
+
+#include <libgen.h>
+#include <unistd.h>
+
+#include <string>
+
+#include "common/log.h"
+#include "common/shell_command.h"
+#include "toolkit/mkcert.h"
+#include "toolkit/mkcert_internal.h"
+#include "toolkit/store_file.h"
+
+namespace {
+
+// Beyond this size the tool only warns and may work for hours.
+constexpr unsigned int kMaxKeyBits = 16384;
+
+// Extra seed material for the tool. These are the machine's own files, not
+// device paths; the tool refuses to run when one of them is missing, so only
+// those that exist are handed on.
+const char* const kSeedFiles[] = {
+    "/var/log/messages", "/var/run/dmesg.boot", "/var/log/system.log",
+    "/etc/hosts",        "/etc/group",          "/etc/resolv.conf",
+    "/bin/ls",
+};
+
+// The existing seed files joined by ":"; empty when none exists.
+std::string ExistingSeedFiles() {
+  std::string list;
+  for (const char* file : kSeedFiles) {
+    if (access(file, F_OK) != 0) continue;
+    if (!list.empty()) list += ':';
+    list += file;
+  }
+  return list;
+}
+
+}  // namespace
+
+int genDir(const char* path) {
+  if (path == nullptr || *path == '\0') {
+    ORVA_LOG("genDir sanity check failed");
+    return -1;
+  }
+  std::string copy(path);
+  ShellCommand command(RootedCommandSize(kToolkitCommandSize));
+  command.Append("mkdir -p %s", {dirname(&copy[0])});
+  return RunShellCommand(command) == 0 ? 0 : -1;
+}
+
+int genKey(const char* keyPath, unsigned int bits) {
+  if (keyPath == nullptr || *keyPath == '\0' || bits == 0 ||
+      bits > kMaxKeyBits) {
+    ORVA_LOG("genKey sanity failed");
+    return -1;
+  }
+  if (genDir(keyPath) != 0) {
+    ORVA_LOG("generate directory failed");
+    return -1;
+  }
+  PendingStoreFile key(keyPath);
+  if (!key.ok()) return -1;
+
+  std::string seeds = ExistingSeedFiles();
+  ShellCommand command(RootedCommandSize(kToolkitCommandSize));
+  if (seeds.empty()) {
+    command.Append("%s genrsa -out %s %d >/dev/null 2>&1",
+                   {OpensslTool(), key.temporary(), bits});
+  } else {
+    command.Append("%s genrsa -rand %s -out %s %d >/dev/null 2>&1",
+                   {OpensslTool(), seeds, key.temporary(), bits});
+  }
+  if (!ToolExitedCleanly(RunShellCommand(command))) {
+    ORVA_LOG("Error when execute \"%s\"", command.line());
+    return -1;
+  }
+  return key.Install();
+}

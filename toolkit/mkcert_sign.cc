@@ -1,0 +1,121 @@
+// Certificates signed from requests: self-signed CA certificates and server
+// certificates signed by the local CA.
+
+#include <string>
+
+#include "common/log.h"
+#include "common/shell_command.h"
+#include "platform/olib/olib_file.h"
+#include "toolkit/mkcert.h"
+#include "toolkit/mkcert_internal.h"
+#include "toolkit/store_file.h"
+
+namespace {
+
+bool IsEmpty(const char* text) { return text == nullptr || *text == '\0'; }
+
+// Writes the server extension file from the ";"-separated `aliases`.
+// 0 or -1 (logged).
+int WriteServerExtensions(const char* extFile, const char* aliases) {
+  OLIBSzListPtr names = SplitAliases(aliases);
+  if (!names) return -1;
+  return generateServerCNF(extFile, names.get());
+}
+
+}  // namespace
+
+OLIBSzListPtr SplitAliases(const char* aliases) {
+  OLIBSZLIST* list = OLIBCSzListAlloc(512);
+  if (list == nullptr) {
+    ORVA_LOG("Out of memory!! size=512");
+    return nullptr;
+  }
+  // OLIBCStrSep may move the list; ownership is taken back from `list`.
+  int separated = OLIBCStrSep(aliases, ";", &list);
+  OLIBSzListPtr owner(list);
+  if (separated == -1) {
+    ORVA_LOG("String separate failed.");
+    return nullptr;
+  }
+  return owner;
+}
+
+int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,
+           const char* serialPath, const char* outputPath, const char* keyPath,
+           BOOL selfSigned, int days, const char* aliases) {
+  if (IsEmpty(extFile) || IsEmpty(requestPath) || IsEmpty(caOrOutput) ||
+      IsEmpty(keyPath) || days <= 0) {
+    ORVA_LOG("genCrt sanity failed");
+    return -1;
+  }
+  if (OLIBCFileExist(requestPath) == 0) {
+    ORVA_LOG("Csr is not existed");
+    return -1;
+  }
+  if (OLIBCFileExist(keyPath) == 0) {
+    ORVA_LOG("Key is not existed");
+    return -1;
+  }
+  if (aliases == nullptr) aliases = "";
+
+  const char* output = nullptr;
+  if (selfSigned == TRUE) {
+    if (generateCACNF(extFile) != 0) return -1;
+    output = caOrOutput;
+  } else {
+    if (IsEmpty(serialPath) || IsEmpty(outputPath)) {
+      ORVA_LOG("genCrt sanity failed");
+      return -1;
+    }
+    if (OLIBCFileExist(serialPath) == 0) {
+      ORVA_LOG("Serial file is not existed");
+      return -1;
+    }
+    if (WriteServerExtensions(extFile, aliases) != 0) return -1;
+    output = outputPath;
+  }
+  if (genDir(output) != 0) {
+    ORVA_LOG("generate directory failed");
+    return -1;
+  }
+
+  PendingStoreFile certificate(output);
+  if (!certificate.ok()) return -1;
+  ShellCommand command(RootedCommandSize(kToolkitCommandSize));
+  command.Append("%s x509 -extfile %s -days %d -in %s -req -sha256 -out %s",
+                 {OpensslTool(), extFile, days, requestPath,
+                  certificate.temporary()});
+  if (selfSigned == TRUE) {
+    command.Append(" -signkey %s >/dev/null 2>&1", {keyPath});
+  } else {
+    command.Append(" -CAserial %s -CA %s -CAkey %s >/dev/null 2>&1",
+                   {serialPath, caOrOutput, keyPath});
+  }
+  if (!ToolExitedCleanly(RunShellCommand(command))) {
+    ORVA_LOG("Error when execute \"%s\"", command.line());
+    return -1;
+  }
+  return certificate.Install();
+}
+
+int genServerCrtHelper(const char* requestPath, const char* caCertPath,
+                       const char* outputPath, const char* caKeyPath, int days,
+                       const char* aliases) {
+  std::string serial = OrvaPath(kSerialPath);
+  if (OLIBCFileExist(serial.c_str()) == 0 && genSerial() != 0) return -1;
+  return genCrt(OrvaPath(kServerCrtCfgPath).c_str(), requestPath, caCertPath,
+                serial.c_str(), outputPath, caKeyPath, FALSE, days, aliases);
+}
+
+int genServerCrt(const char* requestPath, const char* outputPath, int days,
+                 const char* aliases) {
+  return genServerCrtHelper(requestPath, OrvaPath(kCaCrtPath).c_str(),
+                            outputPath, OrvaPath(kCaKeyPath).c_str(), days,
+                            aliases);
+}
+
+int genCACrtHelper(const char* requestPath, const char* outputPath,
+                   const char* keyPath, int days) {
+  return genCrt(OrvaPath(kCaCrtCfgPath).c_str(), requestPath, outputPath,
+                nullptr, nullptr, keyPath, TRUE, days, "");
+}

@@ -1,0 +1,9 @@
+#include "upload/uploadsslca.h"
+
+SSLCAFormHandler::SSLCAFormHandler() : ServerFormHandler(false, nullptr) {}
+
+SSLCAFormHandler::~SSLCAFormHandler() = default;
+
+int SSLCAFormHandler::HandleLoadAction() { return 0; }
+
+int SSLCAFormHandler::HandleApplyAction() { return 0; }
