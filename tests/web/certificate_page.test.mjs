@@ -158,9 +158,27 @@ test('asks for the access token once a session and again when it is refused', {
   assert.equal(await page.locator('#import').getAttribute('open'), '');
   assert.equal(await page.evaluate(() => document.activeElement.textContent), 'Import a certificate');
 
-  // The refused token is the only thing the browser reports, once per list request.
-  assert.ok(consoleErrors.length > 0);
-  for (const error of consoleErrors) assert.match(error, /status of 401/);
+  // With nothing installed, the export has nothing to hand out and says so.
+  await openAction(page, 'export');
+  await form(page, 'export').locator('button[type="submit"]').click();
+  const nothing = await formOutcome(page, 'export');
+  assert.equal(nothing.tone, 'error');
+  assert.match(nothing.text, /^The download failed\. There was nothing to download: no certificate is installed\./);
+
+  await page.locator('#forget-token').click();
+  assert.equal(await page.locator('#token-gate').isVisible(), true);
+  assert.match(await page.locator('#token-reason').textContent(), /forgotten/);
+  assert.equal(await page.evaluate(() => sessionStorage.length), 0, 'the token is gone');
+  await page.locator('#token-input').fill(server.token);
+  await page.locator('#token-input').press('Enter');
+  await page.locator('#empty-store').waitFor({ timeout: WAIT_MS });
+
+  // The browser reports the refused token, once per list request, and the
+  // export's empty answer; nothing else.
+  const refusals = consoleErrors.filter((error) => /status of 401/.test(error));
+  assert.ok(refusals.length > 0);
+  assert.deepEqual(consoleErrors.filter((error) => !refusals.includes(error)),
+    ['Failed to load resource: the server responded with a status of 500 (Internal Server Error)']);
 });
 
 // The management web server serves HTTPS too, so a new certificate restarts it.

@@ -7,6 +7,8 @@ import path from 'node:path';
 
 import { chromium } from 'playwright-core';
 
+import { atTestEnd } from './cleanup.mjs';
+
 const CHROMIUM = '/usr/bin/chromium';
 const FLAGS = ['--headless', '--no-sandbox', '--disable-gpu', '--disable-quic', '--no-first-run',
   '--disable-background-networking', '--disable-component-update', '--disable-sync'];
@@ -18,7 +20,7 @@ export const SCREENSHOT_DIR = process.env.ORVA_SCREENSHOTS || '';
 export async function openBrowser(t, viewport = { width: 1280, height: 900 }) {
   const profile = await mkdtemp(path.join(os.tmpdir(), 'orva-web-profile-'));
   let context = null;
-  t.after(async () => {
+  atTestEnd(t, async () => {
     if (context !== null) await context.close();
     await rm(profile, { recursive: true, force: true });
   });

@@ -8,6 +8,8 @@ import os from 'node:os';
 import path from 'node:path';
 import { promisify } from 'node:util';
 
+import { atTestEnd } from './cleanup.mjs';
+
 const run = promisify(execFile);
 
 export const HOST_BINARY = process.env.ORVA_WEBAPI;
@@ -66,7 +68,8 @@ export async function callMethod(root, api, method, params = {}) {
   return JSON.parse(stdout);
 }
 
-// Starts a server for test `t` and registers its stop with t.after.
+// Starts a server for test `t`; it is stopped, and its device root removed,
+// when the test ends.
 // `prepare(root)` runs after init and before the server starts; with `https`
 // the server also gets a free port for its HTTPS listener.
 // Resolves with { url, token, root, log() }.
@@ -74,7 +77,7 @@ export async function startDeviceServer(t, { prepare, https = false } = {}) {
   if (!HOST_BINARY || !WEB_DIR) throw new Error('ORVA_WEBAPI and ORVA_WEB_DIR must be set');
   const scratch = await mkdtemp(path.join(os.tmpdir(), 'orva-web-test-'));
   let child = null;
-  t.after(async () => {
+  atTestEnd(t, async () => {
     if (child !== null && !exited(child)) {
       child.kill('SIGTERM');
       if (!(await waitForExit(child, STOP_TIMEOUT_MS))) {

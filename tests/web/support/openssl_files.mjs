@@ -7,6 +7,8 @@ import os from 'node:os';
 import path from 'node:path';
 import { promisify } from 'node:util';
 
+import { atTestEnd } from './cleanup.mjs';
+
 const run = promisify(execFile);
 
 export async function openssl(...args) {
@@ -17,7 +19,7 @@ export async function openssl(...args) {
 // A scratch folder for test `t`, removed when the test ends.
 export async function scratchFolder(t) {
   const folder = await mkdtemp(path.join(os.tmpdir(), 'orva-web-files-'));
-  t.after(() => rm(folder, { recursive: true, force: true }));
+  atTestEnd(t, () => rm(folder, { recursive: true, force: true }));
   return folder;
 }
 
