@@ -70,7 +70,7 @@ test('marks a certificate whose validity has not begun, and one without an end',
 });
 
 test('shows times in one unambiguous form', () => {
-  assert.equal(formatCertificateTime(at('2035-12-06T09:03:45Z')), '2035-12-06 09:03 UTC');
+  assert.equal(formatCertificateTime(at('2035-12-06T09:03:45Z')), '2035-12-06 09:03\u00a0UTC');
 });
 
 test('takes alias lists typed one a line, or separated by commas and semicolons', () => {

@@ -41,9 +41,11 @@ export function validityState(from, until, now) {
   return 'valid';
 }
 
-// "2035-12-06 12:23 UTC": unambiguous in every language.
+// "2035-12-06 12:23 UTC": unambiguous in every language. The time of day
+// and "UTC" are joined by a no-break space, so that a narrow column breaks
+// the text only after the date.
 export function formatCertificateTime(date) {
   const pad = (number) => String(number).padStart(2, '0');
   return `${date.getUTCFullYear()}-${pad(date.getUTCMonth() + 1)}-${pad(date.getUTCDate())} ` +
-    `${pad(date.getUTCHours())}:${pad(date.getUTCMinutes())} UTC`;
+    `${pad(date.getUTCHours())}:${pad(date.getUTCMinutes())}\u00a0UTC`;
 }
