@@ -5,7 +5,7 @@
 const HOST_NAME = /^[A-Za-z0-9._*-]{1,253}$/;
 const IPV6_ADDRESS = /^[0-9A-Fa-f:.]{2,45}$/;
 
-export const MAX_ALIASES = 100;
+const MAX_ALIASES = 100;
 
 function acceptedName(name) {
   return HOST_NAME.test(name) || (name.includes(':') && IPV6_ADDRESS.test(name));

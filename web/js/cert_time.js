@@ -7,7 +7,7 @@ const TIME_PATTERN =
 const DAY_MS = 24 * 60 * 60 * 1000;
 
 // Days before the end of validity from which a certificate is marked.
-export const EXPIRY_WARNING_DAYS = 30;
+const EXPIRY_WARNING_DAYS = 30;
 
 // Returns the time as a Date, or null when the text is not such a time.
 export function parseCertificateTime(text) {

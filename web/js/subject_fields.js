@@ -1,8 +1,8 @@
 // Builds the subject fields (country, state, ... e-mail) of the forms from one
 // template, and the key size choices, with their defaults.
 
-export const KEY_SIZES = [2048, 3072, 4096];
-export const DEFAULT_KEY_SIZE = 2048;
+const KEY_SIZES = [2048, 3072, 4096];
+const DEFAULT_KEY_SIZE = 2048;
 
 const CA_DEFAULT_COMMON_NAME = 'Local certificate authority';
 
