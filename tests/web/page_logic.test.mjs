@@ -70,7 +70,8 @@ test('takes alias lists typed one a line or separated, and names those the devic
     assert.deepEqual(parseAliases(text).refused, refused, JSON.stringify(text));
     assert.equal(aliasProblem(text) === '', refused.length === 0, JSON.stringify(text));
   }
-  assert.match(aliasProblem('good bad/name worse/name'), /^“bad\/name” is not a host name or IP address/);
+  assert.match(aliasProblem('good bad/name worse/name'),
+    /^“bad\/name” is not a host name or IP address/);
   const many = Array.from({ length: 101 }, (_, index) => `n${index}`).join('\n');
   assert.equal(aliasProblem(many), 'Enter at most 100 names.');
 });

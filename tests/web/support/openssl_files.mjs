@@ -24,24 +24,24 @@ export async function makeRequest(folder, name, subject) {
   return { key, csr };
 }
 
-// root CA -> intermediate CA -> server certificate valid for `serverDays`,
-// and a key that belongs to none of them.
+// root CA -> intermediate CA -> server certificate valid for `serverDays`;
+// the root's key belongs to none of the three files handed out.
 export async function makeChain(folder, serverDays) {
   const file = (name) => path.join(folder, name);
-  await writeFile(file('ca.ext'), 'basicConstraints=critical,CA:TRUE\nkeyUsage=keyCertSign,cRLSign\n');
+  await writeFile(file('ca.ext'),
+    'basicConstraints=critical,CA:TRUE\nkeyUsage=keyCertSign,cRLSign\n');
   const root = await makeRequest(folder, 'root', '/C=DE/O=Example Trust/CN=Example Root CA');
   await openssl('x509', '-req', '-in', root.csr, '-signkey', root.key, '-days', '3650',
     '-extfile', file('ca.ext'), '-out', file('root.crt'));
   const intermediate = await makeRequest(folder, 'intermediate',
     '/C=DE/O=Example Trust/CN=Example Intermediate CA');
-  await openssl('x509', '-req', '-in', intermediate.csr, '-CA', file('root.crt'), '-CAkey', root.key,
-    '-days', '1800', '-extfile', file('ca.ext'), '-out', file('intermediate.crt'));
+  await openssl('x509', '-req', '-in', intermediate.csr, '-CA', file('root.crt'), '-CAkey',
+    root.key, '-days', '1800', '-extfile', file('ca.ext'), '-out', file('intermediate.crt'));
   const server = await makeRequest(folder, 'server', '/C=DE/O=Example GmbH/CN=files.example.com');
   await openssl('x509', '-req', '-in', server.csr, '-CA', file('intermediate.crt'),
     '-CAkey', intermediate.key, '-days', String(serverDays), '-out', file('server.crt'));
-  const stray = await makeRequest(folder, 'stray', '/CN=stray');
   return {
     serverCert: file('server.crt'), serverKey: server.key,
-    intermediateCert: file('intermediate.crt'), strayKey: stray.key,
+    intermediateCert: file('intermediate.crt'), rootKey: root.key,
   };
 }
