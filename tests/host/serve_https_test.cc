@@ -1,5 +1,6 @@
 // End-to-end tests of the HTTPS listener: what a TLS handshake presents
 // before and after restart-asking calls, and a store that does not load.
+// The certificate life test shows the chain that goes with a certificate.
 
 #include <unistd.h>
 
@@ -23,19 +24,6 @@ constexpr char kServerCrt[] = "/usr/orva/etc/ssl/ssl.crt/server.crt";
 constexpr char kInterCrt[] = "/usr/orva/etc/ssl/ssl.intercrt/server-ca.crt";
 constexpr char kListQuery[] = "/webapi?api=ORVA.Core.Certificate&method=list";
 const httplib::Params kRestart = {{"api", "ORVA.Test"}, {"method", "restart"}};
-
-// Polls handshakes for up to 10 s until `done` holds for one; returns the
-// last one seen.
-template <typename Done>
-PresentedCertificates ProbeUntil(int port, Done done) {
-  auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
-  PresentedCertificates presented = ProbeTls(port);
-  while (!done(presented) && std::chrono::steady_clock::now() < deadline) {
-    std::this_thread::sleep_for(std::chrono::milliseconds(20));
-    presented = ProbeTls(port);
-  }
-  return presented;
-}
 
 // Calls "list" over HTTP every few milliseconds until Finish(), counting
 // the calls that got an answer and those that did not.
@@ -84,23 +72,12 @@ class ServeHttpsTest : public testing::Test {
 }  // namespace
 
 TEST_F(ServeHttpsTest, PresentsTheStoreCertificateAndReloadsItOnRestartCalls) {
-  const std::string work = scratch_.Path("/work");
-  ASSERT_TRUE(MakeSelfSignedCa(work + "/root.key", work + "/root.crt", "/CN=Test Root"));
-  ASSERT_TRUE(MakeSignedCertificate(work + "/root.key", work + "/root.crt", work + "/inter.key",
-                                    scratch_.Path(kInterCrt), "/CN=Test Intermediate"));
-  ASSERT_TRUE(MakeSignedCertificate(work + "/inter.key", scratch_.Path(kInterCrt),
-                                    scratch_.Path(kServerKey), scratch_.Path(kServerCrt),
-                                    "/CN=first.test"));
+  InstallSelfSignedCertificate("first.test");
   const int port = FreeLoopbackPort();
   ServeProcess server(scratch_.root(), {"--listen-https", "127.0.0.1:" + std::to_string(port)});
   ASSERT_TRUE(server.started()) << server.Log();
   ASSERT_EQ(port, server.https_port()) << server.Output() << server.Log();
-
-  PresentedCertificates first = ProbeTls(port);
-  ASSERT_TRUE(first.connected);
-  EXPECT_EQ("first.test", first.common_name);
-  EXPECT_EQ(2, first.chain_length) << "the intermediate goes with it";
-  EXPECT_EQ("Test Intermediate", first.chain_top_name);
+  EXPECT_EQ("first.test", ProbeTls(port).common_name);
 
   HttpWatch watch(server);
   InstallSelfSignedCertificate("second.test");
@@ -112,14 +89,13 @@ TEST_F(ServeHttpsTest, PresentsTheStoreCertificateAndReloadsItOnRestartCalls) {
   ASSERT_TRUE(restart) << "the answer goes out before the listener restarts";
   EXPECT_EQ(200, restart->status);
   EXPECT_TRUE(ParseJson(restart->body)["data"]["restart_httpd"].asBool()) << restart->body;
-  PresentedCertificates second = ProbeUntil(
+  PresentedCertificates second = ProbeTlsUntil(
       port, [](const PresentedCertificates& seen) { return seen.common_name == "second.test"; });
   EXPECT_EQ("second.test", second.common_name);
-  EXPECT_EQ(1, second.chain_length);
 
   scratch_.WriteFile(kServerCrt, "broken\n");
   ASSERT_TRUE(server.AuthorizedClient().Post("/webapi", kRestart));
-  EXPECT_FALSE(ProbeUntil(port, [](const PresentedCertificates& seen) {
+  EXPECT_FALSE(ProbeTlsUntil(port, [](const PresentedCertificates& seen) {
                  return !seen.connected;
                }).connected);
   EXPECT_NE(std::string::npos,
@@ -127,7 +103,7 @@ TEST_F(ServeHttpsTest, PresentsTheStoreCertificateAndReloadsItOnRestartCalls) {
 
   InstallSelfSignedCertificate("mended.test");
   ASSERT_TRUE(server.AuthorizedClient().Post("/webapi", kRestart));
-  EXPECT_EQ("mended.test", ProbeUntil(port, [](const PresentedCertificates& seen) {
+  EXPECT_EQ("mended.test", ProbeTlsUntil(port, [](const PresentedCertificates& seen) {
                              return seen.connected;
                            }).common_name)
       << "up again on the same address";

@@ -118,23 +118,19 @@ TEST(CertificateExport, GeneratedSetsAreHandedOutOnce) {
   }
 }
 
-TEST(CertificateExport, UnknownChoicesSendNothingAndSetNoError) {
-  for (const char* choice : {"Archive", "archive ", "", "CSR_SET", "signed"}) {
-    SCOPED_TRACE(choice);
+TEST(CertificateExport, OtherChoicesSendNothingAndNoChoiceAnswers5503) {
+  for (const char* choice : {"Archive", "archive ", "", "CSR_SET", "signed", (const char*)nullptr}) {
+    SCOPED_TRACE(choice == nullptr ? "no choice" : choice);
     TempDeviceRoot root;
     root.WriteFile("/usr/orva/etc/ssl/ssl.crt/server.crt", "certificate", 0400);
     LogCapture log;
-    ExpectNothingSent(ExportSet(choice));
+    Export result = ExportSet(choice);
+    if (choice != nullptr) ExpectNothingSent(result);
+    EXPECT_EQ(choice != nullptr ? 0 : 5503, result.response.error_code());
+    EXPECT_FALSE(result.download.has_body);
     EXPECT_EQ("", log.Text());
     EXPECT_FALSE(FileExists(root.Path(kArchive)));
   }
-}
-
-TEST(CertificateExport, MissingFileParameterAnswers5503) {
-  TempDeviceRoot root;
-  Export result = ExportSet(nullptr);
-  EXPECT_EQ(5503, result.response.error_code());
-  EXPECT_FALSE(result.download.has_body);
 }
 
 TEST(CertificateExport, FailingArchiverSendsNothingAndKeepsTheGeneratedSet) {

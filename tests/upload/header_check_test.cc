@@ -21,8 +21,6 @@ TEST(HeaderCheck, JudgesTheFirstLineOnly) {
   } cases[] = {
       {"certificate", "-----BEGIN CERTIFICATE-----\nMIIB\n", "CERTIFICATE", CA_CRT, 5502,
        CYPHER_NONE, nullptr},
-      {"comment line first", "# server\n-----BEGIN CERTIFICATE-----\n", "CERTIFICATE", CA_CRT,
-       5510, CYPHER_NONE, nullptr},
       {"no newline", "x CERTIFICATE x", "CERTIFICATE", CA_CRT, 5502, CYPHER_NONE, nullptr},
       {"long first line", std::string(100000, 'A') + "CERTIFICATE\n", "CERTIFICATE", CA_CRT, 5502,
        CYPHER_NONE, nullptr},
