@@ -6,8 +6,8 @@
 #include <gtest/gtest.h>
 
 #include "api/certificate.h"
-#include "common/shell_command.h"
 #include "platform/webapi/api_download.h"
+#include "tests/support/certificates.h"
 #include "tests/support/test_support.h"
 
 namespace {
@@ -34,16 +34,9 @@ Export ExportSet(const char* choice) {
 // Member names of the ZIP archive `body`, one per line, as unzip lists them.
 std::string ZipMembers(const TempDeviceRoot& root, const std::string& body) {
   root.WriteFile("/downloaded.zip", body);
-  ShellCommand list(512);
-  list.Append("unzip -Z1 %s | sort", {root.Path("/downloaded.zip")});
-  ShellPipe pipe(list);
-  std::string names;
-  char buffer[256];
-  while (pipe.stream() != nullptr && std::fgets(buffer, sizeof buffer, pipe.stream())) {
-    names += buffer;
-  }
-  EXPECT_EQ(0, pipe.Close());
-  return names;
+  EXPECT_TRUE(RunForTest("(unzip -Z1 '" + root.Path("/downloaded.zip") + "' | sort >'" +
+                         root.Path("/members") + "')"));
+  return ReadFile(root.Path("/members"));
 }
 
 void ExpectDownload(const Export& result) {
@@ -67,10 +60,10 @@ void ExpectNothingSent(const Export& result) {
 TEST(CertificateExport, ArchivePacksTheInstalledFilesThereAreAndRemovesNothing) {
   TempDeviceRoot root;
   const std::string inter = "/usr/orva/etc/ssl/ssl.intercrt/server-ca.crt";
-  const std::string kept[] = {"/usr/orva/etc/ssl/ssl.crt/ca.crt", "/usr/orva/etc/ssl/ssl.key/ca.key",
-                              "/usr/orva/etc/ssl/ssl.crt/server.crt",
-                              "/usr/orva/etc/ssl/ssl.key/server.key",
-                              "/usr/orva/etc/ssl/.gen/server.csr"};
+  const std::string kept[] = {
+      "/usr/orva/etc/ssl/ssl.crt/ca.crt", "/usr/orva/etc/ssl/ssl.key/ca.key",
+      "/usr/orva/etc/ssl/ssl.crt/server.crt", "/usr/orva/etc/ssl/ssl.key/server.key",
+      "/usr/orva/etc/ssl/.gen/server.csr"};
   for (const std::string& path : kept) root.WriteFile(path, "content of " + path, 0400);
   root.WriteFile(inter, "intermediate", 0400);
 
@@ -119,7 +112,8 @@ TEST(CertificateExport, GeneratedSetsAreHandedOutOnce) {
 }
 
 TEST(CertificateExport, OtherChoicesSendNothingAndNoChoiceAnswers5503) {
-  for (const char* choice : {"Archive", "archive ", "", "CSR_SET", "signed", (const char*)nullptr}) {
+  const char* const choices[] = {"Archive", "archive ", "", "CSR_SET", "signed", nullptr};
+  for (const char* choice : choices) {
     SCOPED_TRACE(choice == nullptr ? "no choice" : choice);
     TempDeviceRoot root;
     root.WriteFile("/usr/orva/etc/ssl/ssl.crt/server.crt", "certificate", 0400);
