@@ -9,107 +9,75 @@
 
 namespace {
 
-// Services and the plug-in record "NAME ARG" in events.log and exit with
-// `status`.
-void WriteRecorders(const TempDeviceRoot& root, const std::vector<std::string>& services,
-                    int status = 0) {
-  for (const std::string& name : services) {
-    std::string path = name == "plugin" ? "/usr/orva/etc/plugins/certificate/notify"
-                                        : "/usr/orva/etc/services/" + name;
-    root.WriteScript(path, "echo \"" + name + " $1 $2\" >> \"$ORVA_ROOT/events.log\"; exit " +
-                               std::to_string(status));
-  }
-}
-
-// Runs the sequence; true when it asked for the host's restart in both the
-// result and the response, and released the plug-in handle.
-bool Activate(ActivationSequence sequence) {
-  ORVA::APIResponse response;
-  Json::Value result(Json::objectValue);
-  result["restart_httpd"] = false;
-  OLIBPLUGIN_HANDLE handle = nullptr;
-  activateCertificate(sequence, &response, result, OrvaConf(), &handle, "/src/upload/uploadsslca.cc");
-  EXPECT_EQ(nullptr, handle) << "the filled handle is released after use";
-  EXPECT_EQ(ORVA::APIResponse::Outcome::kNone, response.outcome());
-  EXPECT_EQ(result["restart_httpd"].asBool(), response.httpd_restart());
-  return response.httpd_restart();
-}
+const std::vector<std::string> kAll = {"ftpd-ssl", "webdav-httpd-ssl", "pagora", "httpd-user",
+                                       "plugin"};
+const char kYesYes[] = "runHTTPS=\"yes\"\nrunWebHTTPS=yes\n";
 
 }  // namespace
 
-TEST(Activation, SequencesRestartEnabledServicesInTheirOrderThenNotifyPlugins) {
-  const struct { ActivationSequence sequence; const char* events; } cases[] = {
-      {kActivateAfterCreation,
-       "ftpd-ssl restart \npagora restart \nwebdav-httpd-ssl restart \n"
-       "plugin certificate/change 5\n"},
-      {kActivateAfterImport,
-       "webdav-httpd-ssl restart \nftpd-ssl restart \npagora restart \n"
-       "plugin certificate/change 5\n"},
-  };
-  for (const auto& c : cases) {
-    SCOPED_TRACE(c.sequence);
-    TempDeviceRoot root;
-    WriteRecorders(root, {"ftpd-ssl", "webdav-httpd-ssl", "pagora", "httpd-user", "plugin"});
-    root.WriteFile("/usr/orva/etc/orva.conf", "runHTTPS=\"yes\"\nrunWebHTTPS=yes\n");
-    LogCapture log;
-    EXPECT_TRUE(Activate(c.sequence));
-    EXPECT_EQ(c.events, ReadFile(root.Path("/events.log")));
-    EXPECT_EQ("", log.Text());
-  }
-}
-
-TEST(Activation, HttpdUserIsRestartedWithoutAskingWhetherItIsEnabled) {
-  TempDeviceRoot root;
-  root.WriteFile("/usr/orva/etc/orva.conf", "runWebHTTPS=\"yes\"\n");
-  for (ActivationSequence sequence : {kActivateAfterCreation, kActivateAfterImport}) {
-    SCOPED_TRACE(sequence);
-    LogCapture log;
-    Activate(sequence);
-    EXPECT_TRUE(log.Contains("uploadsslca.cc:")) << log.Text();
-    EXPECT_TRUE(log.Contains(" Failed to restart httpd user\n")) << log.Text();
-  }
-  WriteRecorders(root, {"httpd-user"});
-  Activate(kActivateAfterImport);
-  EXPECT_EQ("httpd-user restart \n", ReadFile(root.Path("/events.log")));
-}
-
-TEST(Activation, OnlyExactlyYesRestartsTheUserWebServerOrTheHost) {
-  const struct { const char* configuration; bool host_restart; } cases[] = {
-      {"", false},
-      {"runWebHTTPS=\"YES\"\nrunHTTPS=\"Yes\"\n", false},
-      {"runWebHTTPS=\"yes \"\nrunHTTPS=\"no\"\n", false},
-      {"runWebHTTPS=\"no\"\nrunHTTPS=\"yes\"\n", true},
-  };
-  for (const auto& c : cases) {
-    SCOPED_TRACE(c.configuration);
-    TempDeviceRoot root;
-    WriteRecorders(root, {"pagora", "httpd-user"});
-    root.WriteFile("/usr/orva/etc/orva.conf", c.configuration);
-    LogCapture log;
-    EXPECT_EQ(c.host_restart, Activate(kActivateAfterImport));
-    EXPECT_EQ("", ReadFile(root.Path("/events.log")));
-    EXPECT_EQ("", log.Text());
-  }
-}
-
-TEST(Activation, EveryFailureIsLoggedOnceInOrderWithTheSequencesTexts) {
-  const struct { ActivationSequence sequence; const char* log; } cases[] = {
-      {kActivateAfterCreation,
+// What each sequence restarts, in which order, what it logs (messages only,
+// each naming the caller's file) and whether it asks for the host's restart.
+TEST(Activation, RestartsEnabledServicesInTheSequencesOrderAndLogsEachFailureOnce) {
+  const struct {
+    ActivationSequence sequence;
+    std::vector<std::string> services;  // "plugin" is the certificate plug-in
+    int status;                         // with which every script exits
+    const char *configuration, *events, *log;
+    bool host_restart;
+  } cases[] = {
+      {kActivateAfterCreation, kAll, 0, kYesYes,
+       "ftpd-ssl restart\npagora restart\nwebdav-httpd-ssl restart\nplugin certificate/change 5\n",
+       "", true},
+      {kActivateAfterImport, kAll, 0, kYesYes,
+       "webdav-httpd-ssl restart\nftpd-ssl restart\npagora restart\nplugin certificate/change 5\n",
+       "", true},
+      // The user web server only for exactly "yes"; "httpd-user" when
+      // "pagora" is disabled, without asking whether it is enabled.
+      {kActivateAfterImport, {"pagora", "httpd-user"}, 0, "", "", "", false},
+      {kActivateAfterImport, {"pagora", "httpd-user"}, 0, "runWebHTTPS=\"YES\"\nrunHTTPS=\"Yes\"\n",
+       "", "", false},
+      {kActivateAfterImport, {"pagora", "httpd-user"}, 0, "runWebHTTPS=\"yes \"\nrunHTTPS=no\n", "",
+       "", false},
+      {kActivateAfterImport, {"pagora", "httpd-user"}, 0, "runWebHTTPS=no\nrunHTTPS=\"yes\"\n", "",
+       "", true},
+      {kActivateAfterImport, {"httpd-user"}, 0, "runWebHTTPS=yes\n", "httpd-user restart\n", "",
+       false},
+      {kActivateAfterCreation, {}, 0, "runWebHTTPS=yes\n", "", "Failed to restart httpd user\n",
+       false},
+      {kActivateAfterCreation, kAll, 3, kYesYes,
+       "ftpd-ssl restart\npagora restart\nwebdav-httpd-ssl restart\nplugin certificate/change 5\n",
        "Failed to restart FTP\nFailed to restart Pagora\nFailed to restart https WebDAV\n"
-       "Fail to do post action for certificate plugin\n"},
-      {kActivateAfterImport,
-       "Failed to restart https webdav\nFailed to restart service ftps\n"
-       "Failed to restart Pagora\nFail to do post action for certificate plugin\n"},
+       "Fail to do post action for certificate plugin\n",
+       true},
+      {kActivateAfterImport, kAll, 3, kYesYes,
+       "webdav-httpd-ssl restart\nftpd-ssl restart\npagora restart\nplugin certificate/change 5\n",
+       "Failed to restart https webdav\nFailed to restart service ftps\nFailed to restart Pagora\n"
+       "Fail to do post action for certificate plugin\n",
+       true},
   };
   for (const auto& c : cases) {
-    SCOPED_TRACE(c.sequence);
+    SCOPED_TRACE(std::to_string(c.sequence) + " " + c.configuration + c.events + c.log);
     TempDeviceRoot root;
-    WriteRecorders(root, {"ftpd-ssl", "webdav-httpd-ssl", "pagora", "plugin"}, 3);
-    root.WriteFile("/usr/orva/etc/orva.conf", "runHTTPS=\"yes\"\nrunWebHTTPS=\"yes\"\n");
+    for (const std::string& name : c.services) {
+      root.WriteScript(name == "plugin" ? "/usr/orva/etc/plugins/certificate/notify"
+                                        : "/usr/orva/etc/services/" + name,
+                       "echo " + name + " $1 $2 >> \"$ORVA_ROOT/events.log\"; exit " +
+                           std::to_string(c.status));
+    }
+    root.WriteFile("/usr/orva/etc/orva.conf", c.configuration);
+    ORVA::APIResponse response;
+    Json::Value result(Json::objectValue);
+    result["restart_httpd"] = false;
+    OLIBPLUGIN_HANDLE handle = nullptr;
     LogCapture log;
-    EXPECT_TRUE(Activate(c.sequence));
-    std::string messages =
-        std::regex_replace(log.Text(), std::regex("orva-test: uploadsslca\\.cc:[0-9]+ "), "");
-    EXPECT_EQ(c.log, messages) << log.Text();
+    activateCertificate(c.sequence, &response, result, OrvaConf(), &handle,
+                        "/src/upload/uploadsslca.cc");
+    const std::regex prefix("orva-test: uploadsslca\\.cc:[0-9]+ ");
+    EXPECT_EQ(c.log, std::regex_replace(log.Text(), prefix, ""));
+    EXPECT_EQ(c.events, ReadFile(root.Path("/events.log")));
+    EXPECT_EQ(c.host_restart, result["restart_httpd"].asBool());
+    EXPECT_EQ(c.host_restart, response.httpd_restart());
+    EXPECT_EQ(ORVA::APIResponse::Outcome::kNone, response.outcome());
+    EXPECT_EQ(nullptr, handle) << "the filled handle is released after use";
   }
 }

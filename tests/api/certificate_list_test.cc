@@ -6,7 +6,6 @@
 #include <gtest/gtest.h>
 
 #include "api/certificate.h"
-#include "api/certificate_info.h"
 #include "tests/support/certificates.h"
 #include "tests/support/test_support.h"
 
@@ -18,7 +17,8 @@ const char kCaKey[] = "/usr/orva/etc/ssl/ssl.key/ca.key";
 
 // A store with a local CA and a server certificate it signed.
 void InstallCaAndServer(const TempDeviceRoot& root) {
-  ASSERT_TRUE(MakeSelfSignedCa(root.Path(kCaKey), root.Path(kCaCrt), "/C=TW/O=Test CA/CN=Test Root"));
+  ASSERT_TRUE(
+      MakeSelfSignedCa(root.Path(kCaKey), root.Path(kCaCrt), "/C=TW/O=Test CA/CN=Test Root"));
   ASSERT_TRUE(MakeSignedCertificate(
       root.Path(kCaKey), root.Path(kCaCrt), root.Path("/usr/orva/etc/ssl/ssl.key/server.key"),
       root.Path(kServerCrt),
@@ -47,7 +47,8 @@ TEST(CertificateList, EmptyStoreAnswers5504AndLogsTheMissingFile) {
   ORVA::APIResponse response = List();
   EXPECT_EQ(5504, response.error_code());
   EXPECT_TRUE(response.data().isNull());
-  EXPECT_TRUE(log.Contains(" File /usr/orva/etc/ssl/ssl.crt/server.crt not existed.\n")) << log.Text();
+  EXPECT_TRUE(log.Contains(" File /usr/orva/etc/ssl/ssl.crt/server.crt not existed.\n"))
+      << log.Text();
 }
 
 TEST(CertificateList, ListsServerThenCaAndAddsDatesOnRequest) {
@@ -82,9 +83,12 @@ TEST(CertificateList, TypeSelectsFilesAndIntermediateIsOptionalOnlyForAll) {
   EXPECT_EQ("root_cert", ca_only[0]["type"].asString());
   EXPECT_EQ(Parse(R"({"certificates":[]})"), List(R"({"type":"ALL"})").data());
 
-  // A chain file: every certificate it holds is listed, in file order.
+  // A chain file: its certificates are listed in file order up to the first
+  // block that does not decode.
   root.WriteFile("/usr/orva/etc/ssl/ssl.intercrt/server-ca.crt",
-                 ReadFile(root.Path(kCaCrt)) + ReadFile(root.Path(kServerCrt)));
+                 ReadFile(root.Path(kCaCrt)) + ReadFile(root.Path(kServerCrt)) +
+                     "-----BEGIN CERTIFICATE-----\nnot base64\n-----END CERTIFICATE-----\n" +
+                     ReadFile(root.Path(kCaCrt)));
   const Json::Value all = List().data()["certificates"];
   ASSERT_EQ(4u, all.size());
   EXPECT_EQ("inter_cert", all[2]["type"].asString());
@@ -99,7 +103,8 @@ TEST(CertificateList, MissingCaAnswers5504AndUnopenableServer5501) {
   {
     LogCapture log;
     EXPECT_EQ(5504, List().error_code());
-    EXPECT_TRUE(log.Contains(" File /usr/orva/etc/ssl/ssl.crt/ca.crt not existed.\n")) << log.Text();
+    EXPECT_TRUE(log.Contains(" File /usr/orva/etc/ssl/ssl.crt/ca.crt not existed.\n"))
+        << log.Text();
   }
   std::remove(root.Path(kServerCrt).c_str());
   ASSERT_EQ(0, symlink(root.Path("/nowhere").c_str(), root.Path(kServerCrt).c_str()));
@@ -107,23 +112,4 @@ TEST(CertificateList, MissingCaAnswers5504AndUnopenableServer5501) {
   EXPECT_EQ(5501, List().error_code());
   EXPECT_TRUE(log.Contains(" Get certificate info failed./usr/orva/etc/ssl/ssl.crt/server.crt\n"))
       << log.Text();
-}
-
-TEST(CertificateInfo, ReadingStopsAtABrokenBlockAndOtherPathsHaveNoType) {
-  TempDeviceRoot root;
-  InstallCaAndServer(root);
-  ORVA::APIRequest request("a", "m", 1, Json::Value());
-  root.WriteFile("/copy.pem", ReadFile(root.Path(kServerCrt)) +
-                                  "-----BEGIN CERTIFICATE-----\nnot base64\n-----END CERTIFICATE-----\n" +
-                                  ReadFile(root.Path(kCaCrt)));
-  Json::Value entries;
-  ASSERT_EQ(0, getCertificateInfo(root.Path("/copy.pem"), entries, &request));
-  ASSERT_EQ(1u, entries.size());
-  EXPECT_FALSE(entries[0].isMember("type"));
-
-  root.WriteFile("/empty.pem", "");
-  Json::Value none;
-  EXPECT_EQ(0, getCertificateInfo(root.Path("/empty.pem"), none, &request));
-  EXPECT_TRUE(none.isNull());
-  EXPECT_EQ(4, getCertificateInfo(root.Path("/missing.pem"), none, &request));
 }

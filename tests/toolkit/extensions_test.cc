@@ -60,7 +60,8 @@ TEST(GenerateServerCNF, RefusesNamesThatCouldInjectExtensions) {
                             "a\\b", "a'b", "fe80::1%eth0", "a=b"}) {
     SCOPED_TRACE(alias);
     LogCapture log;
-    EXPECT_EQ(-1, generateServerCNF(root.Path("/cfg").c_str(), Split(std::string("ok;") + alias).get()));
+    EXPECT_EQ(-1, generateServerCNF(root.Path("/cfg").c_str(),
+                                    Split(std::string("ok;") + alias).get()));
     EXPECT_TRUE(log.Contains(" Alias 2 is neither a host name nor an IP address")) << log.Text();
     EXPECT_EQ("old\n", ReadFile(root.Path("/cfg")));
   }

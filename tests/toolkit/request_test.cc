@@ -61,7 +61,8 @@ TEST_F(GenCsrTest, WritesTheConfigurationAndAReadOnlyRequest) {
 }
 
 TEST_F(GenCsrTest, QuotesBackslashesAndUtf8ArriveIntact) {
-  CSR_ARGUMENT subject{"TW", "", "Z\xC3\xBCrich", "O'Reilly \\ $HOME #1 \"x\"", "ends with \\", "'", ""};
+  CSR_ARGUMENT subject{"TW", "", "Z\xC3\xBCrich", "O'Reilly \\ $HOME #1 \"x\"", "ends with \\",
+                       "'", ""};
   ASSERT_EQ(0, Run(&subject));
   EXPECT_EQ("/C=TW/L=Z\\xC3\\xBCrich/O=O'Reilly \\ $HOME #1 \"x\"/OU=ends with \\/CN='",
             RequestSubject(root_.Path(kRequest)));

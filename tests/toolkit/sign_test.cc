@@ -13,6 +13,7 @@ namespace {
 
 const std::string kCaCrt = "/usr/orva/etc/ssl/ssl.crt/ca.crt";
 const std::string kCaKey = "/usr/orva/etc/ssl/ssl.key/ca.key";
+const std::string kCaCsr = "/usr/orva/etc/ssl/ssl.csr/ca.csr";
 const std::string kSerial = "/usr/orva/etc/ssl/.mkcert.serial";
 const std::string kServerExt = "/usr/orva/etc/ssl/cfg.d/server.crt.cfg";
 const std::string kCsr = "/upload/server.csr";
@@ -39,7 +40,7 @@ class SignTest : public testing::Test {
 }  // namespace
 
 TEST_F(SignTest, LocalCaIsProvenForTenYearsAndSignsTheAliasesIntoAVerifiableCertificate) {
-  for (const std::string& file : {kCaCrt, kCaKey, std::string("/usr/orva/etc/ssl/ssl.csr/ca.csr")}) {
+  for (const std::string& file : {kCaCrt, kCaKey, kCaCsr}) {
     EXPECT_EQ(0400, FileMode(Path(file))) << file;
   }
   const std::string ca = "'" + Path(kCaCrt) + "'";
@@ -77,8 +78,12 @@ TEST_F(SignTest, SerialFileIsMadeOnceAndAdvancedByEachSigning) {
 
 TEST_F(SignTest, RefusalsComeInOrderBeforeAnyFileIsWritten) {
   root_.WriteFile(kSerial, "01");
-  const struct { std::string request, key, serial; BOOL flag; int days; const char *aliases, *message; }
-  cases[] = {
+  const struct {
+    std::string request, key, serial;
+    BOOL flag;
+    int days;
+    const char *aliases, *message;
+  } cases[] = {
       {kCsr, kCaKey, kSerial, TRUE, 0, "", "genCrt sanity failed"},
       {"/none", "/none", kSerial, FALSE, 1, "", "Csr is not existed"},
       {kCsr, "/none", kSerial, FALSE, 1, "", "Key is not existed"},

@@ -47,5 +47,6 @@ bool RunAsUnprivilegedUser(const TempDeviceRoot& root, const std::function<bool(
 
 void FailToolSubcommand(const TempDeviceRoot& root, const std::string& failing) {
   root.WriteScript("/usr/orva/bin/openssl", "if [ \"$1\" = " + failing +
-                                                " ]; then exit 1; fi\nexec /usr/bin/openssl \"$@\"");
+                                                " ]; then exit 1; fi\n"
+                                                "exec /usr/bin/openssl \"$@\"");
 }
