@@ -28,23 +28,7 @@ TEST(FillCSRInfo, ReadsTheSelectedSetAndFallsBackToDefaults) {
   EXPECT_EQ("Taipei", ca.state);
   EXPECT_EQ("Local CA", ca.common_name);
   EXPECT_NE(server.email, ca.email);
-}
 
-TEST(FillCSRInfo, SecondCallOverwritesEveryMember) {
-  Json::Value first(Json::objectValue);
-  first["country"] = "DE";
-  first["email"] = "a@b.c";
-  ORVA::APIRequest request1("a", "m", 1, first);
-  ORVA::APIRequest request2("a", "m", 1, Json::Value());
-  CSR_ARGUMENT record;
-  fillCSRInfo(&request1, &record, false);
-  fillCSRInfo(&request2, &record, false);
-  EXPECT_EQ("TW", record.country);
-  EXPECT_NE("a@b.c", record.email);
-}
-
-TEST(FillCSRInfo, NullRecordIsRefusedAndLogged) {
-  ORVA::APIRequest request("a", "m", 1, Json::Value());
   LogCapture log;
   EXPECT_EQ(-1, fillCSRInfo(&request, nullptr, false));
   EXPECT_TRUE(log.Contains(" sanity check failed\n")) << log.Text();

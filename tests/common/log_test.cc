@@ -4,12 +4,15 @@
 #include "platform/olib/olib_error.h"
 #include "tests/support/test_support.h"
 
-TEST(Log, PrefixesFileBaseNameAndLine) {
+TEST(Log, PrefixesFileBaseNameAndLineAndSeesTheCallersErrno) {
   LogCapture log;
   int line = __LINE__ + 1;
   ORVA_LOG("Key is not existed");
+  errno = ENOENT;
+  ORVA_LOG("%s failed.(errno:%d/%m)", "mkdir", errno);
   EXPECT_TRUE(log.Contains("log_test.cc:" + std::to_string(line) + " Key is not existed\n"))
       << log.Text();
+  EXPECT_TRUE(log.Contains(" mkdir failed.(errno:2/No such file or directory)\n")) << log.Text();
 }
 
 TEST(Log, AppendsTheSystemLibraryLastError) {
@@ -18,13 +21,6 @@ TEST(Log, AppendsTheSystemLibraryLastError) {
   ORVA_LOG_LASTERR("Open %s failed", "/usr/orva/etc/ssl/cfg.d/ca.cfg");
   EXPECT_TRUE(log.Contains(" Open /usr/orva/etc/ssl/cfg.d/ca.cfg failed[0x002A olib_file.cc:77]\n"))
       << log.Text();
-}
-
-TEST(Log, ErrnoConversionSeesTheCallersErrno) {
-  LogCapture log;
-  errno = ENOENT;
-  ORVA_LOG("%s failed.(errno:%d/%m)", "mkdir", errno);
-  EXPECT_TRUE(log.Contains(" mkdir failed.(errno:2/No such file or directory)")) << log.Text();
 }
 
 TEST(Log, AsVariantNamesTheCallersFile) {

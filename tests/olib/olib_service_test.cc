@@ -11,25 +11,15 @@
 #include "platform/olib/olib_service.h"
 #include "tests/support/test_support.h"
 
-namespace {
-const char kServices[] = "/usr/orva/etc/services/";
-}  // namespace
-
-TEST(OlibService, RestartRunsTheServiceExecutableWithRestart) {
+TEST(OlibService, RestartRunsTheEnabledServiceExecutableAndReportsFailures) {
   TempDeviceRoot root;
-  root.WriteScript(std::string(kServices) + "ftpd-ssl",
-                   "echo \"$1\" >> \"$ORVA_ROOT/ftpd.log\"");
+  root.WriteScript("/usr/orva/etc/services/ftpd-ssl", "echo \"$1\" >> \"$ORVA_ROOT/ftpd.log\"");
+  root.WriteFile("/usr/orva/etc/services/pagora", "#!/bin/sh\n", 0644);
+  root.WriteScript("/usr/orva/etc/services/broken", "exit 3");
 
   EXPECT_NE(0, OLIBServiceIsEnabled("ftpd-ssl"));
   EXPECT_EQ(0, OLIBServiceRestart("ftpd-ssl"));
   EXPECT_EQ("restart\n", ReadFile(root.Path("/ftpd.log")));
-}
-
-TEST(OlibService, DisabledFailingAndUnsafeServices) {
-  TempDeviceRoot root;
-  root.WriteFile(std::string(kServices) + "pagora", "#!/bin/sh\n", 0644);
-  root.WriteScript(std::string(kServices) + "broken", "exit 3");
-
   EXPECT_EQ(0, OLIBServiceIsEnabled("pagora")) << "not executable: disabled";
   EXPECT_EQ(0, OLIBServiceIsEnabled("missing"));
   EXPECT_LT(OLIBServiceRestart("broken"), 0);
@@ -52,31 +42,25 @@ TEST(OlibProcess, WaitKillsChildThatOutlivesTheLimit) {
 
 TEST(OlibPlugin, ActionRunsEveryPluginOfTheGroupInNameOrder) {
   TempDeviceRoot root;
+  OLIBPLUGIN_HANDLE handle = nullptr;
+  ASSERT_EQ(0, OLIBPluginSDKInit("certificate", "certificate/change", &handle));
+  EXPECT_EQ(0, OLIBPluginAction(5, handle)) << "a group without plug-ins";
+  OLIBPluginExit(handle);
+
   const std::string group = "/usr/orva/etc/plugins/certificate/";
   root.WriteScript(group + "20-second", "echo \"second $1 $2\" >> \"$ORVA_ROOT/plugins.log\"");
-  root.WriteScript(group + "10-first", "echo \"first $1 $2\" >> \"$ORVA_ROOT/plugins.log\"; exit 1");
-
-  OLIBPLUGIN_HANDLE handle = nullptr;
+  root.WriteScript(group + "10-first",
+                   "echo \"first $1 $2\" >> \"$ORVA_ROOT/plugins.log\"; exit 1");
   ASSERT_EQ(0, OLIBPluginSDKInit("certificate", "certificate/change", &handle));
   ASSERT_NE(0, OLIBPluginHasInit(handle));
   EXPECT_LT(OLIBPluginAction(5, handle), 0) << "one plug-in failed";
   OLIBPluginExit(handle);
-
   EXPECT_EQ("first certificate/change 5\nsecond certificate/change 5\n",
             ReadFile(root.Path("/plugins.log")));
-}
-
-TEST(OlibPlugin, GroupWithoutPluginsAndBadArguments) {
-  TempDeviceRoot root;
-  OLIBPLUGIN_HANDLE handle = nullptr;
-  ASSERT_EQ(0, OLIBPluginSDKInit("certificate", "certificate/change", &handle));
-  EXPECT_EQ(0, OLIBPluginAction(5, handle));
-  OLIBPluginExit(handle);
 
   OLIBPLUGIN_HANDLE refused = nullptr;
   EXPECT_LT(OLIBPluginSDKInit("../etc", "certificate/change", &refused), 0);
   EXPECT_EQ(nullptr, refused);
   EXPECT_EQ(0, OLIBPluginHasInit(nullptr));
   EXPECT_LT(OLIBPluginAction(5, nullptr), 0);
-  OLIBPluginExit(nullptr);
 }

@@ -6,23 +6,14 @@
 
 TEST(OrvaConf, ReadsQuotedAndBareValuesOfTheDeviceRoot) {
   TempDeviceRoot root;
+  EXPECT_EQ("", OrvaConf().Info("runHTTPS", "")) << "a missing file has no settings";
   root.WriteFile("/usr/orva/etc/orva.conf",
-                 "# system settings\n"
-                 "runHTTPS=\"yes\"\n"
-                 "runWebHTTPS=no\n"
-                 "\n"
-                 "spaced=\"yes \"\r\n");
+                 "# system settings\nrunHTTPS=\"yes\"\nrunWebHTTPS=no\n\nspaced=\"yes \"\r\n");
   OrvaConf conf;
   EXPECT_EQ("yes", conf.Info("runHTTPS", ""));
   EXPECT_EQ("no", conf.Info("runWebHTTPS", ""));
   EXPECT_EQ("yes ", conf.Info("spaced", ""));
   EXPECT_EQ("", conf.Info("unset", ""));
-}
-
-TEST(OrvaConf, MissingFileHasNoSettings) {
-  TempDeviceRoot root;
-  OrvaConf conf;
-  EXPECT_EQ("", conf.Info("runHTTPS", ""));
 }
 
 TEST(OrvaRoot, PlacesDevicePathsUnderTheRoot) {

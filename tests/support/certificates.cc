@@ -1,24 +1,24 @@
 #include "tests/support/certificates.h"
 
+#include <cstdio>
 #include <cstdlib>
+#include <initializer_list>
 
 #include "tests/support/test_support.h"
 
 namespace {
 
+// `text` as one shell word.
 std::string Quote(const std::string& text) {
   std::string quoted = "'";
-  for (char c : text) {
-    if (c == '\'') {
-      quoted += "'\\''";
-    } else {
-      quoted += c;
-    }
-  }
+  for (char c : text) quoted += c == '\'' ? std::string("'\\''") : std::string(1, c);
   return quoted + "'";
 }
 
-void MakeParent(const std::string& path) { MakeDirs(path.substr(0, path.rfind('/'))); }
+// Makes the folders of each path's parent.
+void MakeParents(std::initializer_list<std::string> paths) {
+  for (const std::string& path : paths) MakeDirs(path.substr(0, path.rfind('/')));
+}
 
 }  // namespace
 
@@ -28,32 +28,27 @@ bool RunForTest(const std::string& commandLine) {
 
 bool MakeSelfSignedCa(const std::string& keyPath, const std::string& certPath,
                       const std::string& subject, int bits) {
-  MakeParent(keyPath);
-  MakeParent(certPath);
-  return RunForTest("openssl req -x509 -newkey rsa:" + std::to_string(bits) +
-                    " -nodes -keyout " + Quote(keyPath) + " -out " +
-                    Quote(certPath) + " -days 365 -subj " + Quote(subject));
+  MakeParents({keyPath, certPath});
+  return RunForTest("openssl req -x509 -newkey rsa:" + std::to_string(bits) + " -nodes -keyout " +
+                    Quote(keyPath) + " -out " + Quote(certPath) + " -days 365 -subj " +
+                    Quote(subject));
 }
 
 bool MakeRequest(const std::string& keyPath, const std::string& csrPath,
                  const std::string& subject, int bits) {
-  MakeParent(keyPath);
-  MakeParent(csrPath);
-  return RunForTest("openssl req -newkey rsa:" + std::to_string(bits) +
-                    " -nodes -keyout " + Quote(keyPath) + " -out " +
-                    Quote(csrPath) + " -subj " + Quote(subject));
+  MakeParents({keyPath, csrPath});
+  return RunForTest("openssl req -newkey rsa:" + std::to_string(bits) + " -nodes -keyout " +
+                    Quote(keyPath) + " -out " + Quote(csrPath) + " -subj " + Quote(subject));
 }
 
-bool MakeSignedCertificate(const std::string& caKeyPath,
-                           const std::string& caCertPath,
-                           const std::string& keyPath,
-                           const std::string& certPath,
+bool MakeSignedCertificate(const std::string& caKeyPath, const std::string& caCertPath,
+                           const std::string& keyPath, const std::string& certPath,
                            const std::string& subject, int bits) {
   std::string csr = certPath + ".csr";
   bool made = MakeRequest(keyPath, csr, subject, bits) &&
-              RunForTest("openssl x509 -req -in " + Quote(csr) + " -CA " +
-                         Quote(caCertPath) + " -CAkey " + Quote(caKeyPath) +
-                         " -set_serial 7 -days 200 -out " + Quote(certPath));
+              RunForTest("openssl x509 -req -in " + Quote(csr) + " -CA " + Quote(caCertPath) +
+                         " -CAkey " + Quote(caKeyPath) + " -set_serial 7 -days 200 -out " +
+                         Quote(certPath));
   std::remove(csr.c_str());
   return made;
 }

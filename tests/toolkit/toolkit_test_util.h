@@ -10,19 +10,14 @@
 // A complete subject with a two-letter country.
 CSR_ARGUMENT FullSubject();
 
-// The certificate at `path` printed as text by the OpenSSL library; "" when
-// it cannot be read.
-std::string CertificateText(const std::string& path);
-
-// Names of the entries of `directory` that look like the toolkit's
-// temporary files (".tmp" in the name), joined by blanks.
+// Names of the entries of `directory` holding ".tmp" (the toolkit's
+// temporary files), joined by blanks.
 std::string TemporaryFilesIn(const std::string& directory);
 
 // Runs `body` as an unprivileged user: when the tests run as root, in a
 // child process that owns the device root and has given up root's rights;
 // otherwise directly. True when `body` returned true.
-bool RunAsUnprivilegedUser(const TempDeviceRoot& root,
-                           const std::function<bool()>& body);
+bool RunAsUnprivilegedUser(const TempDeviceRoot& root, const std::function<bool()>& body);
 
 // Replaces the device's openssl with a script that runs the real tool
 // except for the subcommand `failing`, which ends with exit code 1.
