@@ -69,12 +69,13 @@ void doCertificateExport_v1(ORVA::APIRequest* request,
 
 void doCertificateImport_v1(ORVA::APIRequest* request,
                             ORVA::APIResponse* response) {
+  SSLCAFormHandler handler;
   CheckThen(request, response,
             {{"cert_tmp", kTextRule, true},
              {"key_tmp", kTextRule, true},
              {"inter_cert_tmp", kTextRule, false}},
-            [](ORVA::APIRequest*, ORVA::APIResponse* answer) {
-              answer->SetError(kErrFailed, Json::Value());
+            [&handler](ORVA::APIRequest* checked, ORVA::APIResponse* answer) {
+              handler.ProcessJsonReq(checked, answer);
             });
 }
 

@@ -36,4 +36,10 @@ struct DirCloser {
 };
 using DirPtr = std::unique_ptr<DIR, DirCloser>;
 
+// A stack of certificates that owns them: all are freed with the stack.
+struct X509StackDeleter {
+  void operator()(STACK_OF(X509)* stack) const { sk_X509_pop_free(stack, X509_free); }
+};
+using X509StackPtr = std::unique_ptr<STACK_OF(X509), X509StackDeleter>;
+
 #endif  // ORVA_COMMON_RAII_H_

@@ -20,17 +20,22 @@ CallOutcome HostFailure(int status) {
   return outcome;
 }
 
-CallOutcome CallApi(const ORVA::APIEntry* table, const std::string& api,
-                    const std::string& method, int version,
-                    const Json::Value& params) {
-  const ORVA::APIEntry* row = nullptr;
+const ORVA::APIEntry* FindApiRow(const ORVA::APIEntry* table,
+                                 const std::string& api,
+                                 const std::string& method, int version) {
   for (int i = 0; table != nullptr && i < kModuleApiCount; ++i) {
     if (api == table[i].api && method == table[i].method &&
         version == table[i].version) {
-      row = &table[i];
-      break;
+      return &table[i];
     }
   }
+  return nullptr;
+}
+
+CallOutcome CallApi(const ORVA::APIEntry* table, const std::string& api,
+                    const std::string& method, int version,
+                    const Json::Value& params) {
+  const ORVA::APIEntry* row = FindApiRow(table, api, method, version);
   if (row == nullptr) return HostFailure(404);
 
   ORVA::APIRequest request(api, method, version, params);

@@ -27,6 +27,12 @@ inline constexpr int kModuleApiCount = 7;
 // name files on the device.
 bool IsHostOnlyParameter(const std::string& name);
 
+// The row of `table` (kModuleApiCount rows, owned by the module) that
+// serves api, version and method, or null when none does.
+const ORVA::APIEntry* FindApiRow(const ORVA::APIEntry* table,
+                                 const std::string& api,
+                                 const std::string& method, int version);
+
 // Calls the row of `table` (kModuleApiCount rows) matching api, version and
 // method with `params` (a JSON object of text values). Unknown rows answer
 // 404; a handler that throws or ends without any answer answers 500.

@@ -122,6 +122,15 @@ std::string FirstMacAddress() {
 
 }  // namespace
 
+bool UseDeviceRoot(const std::string& root, std::string* absolute) {
+  char* resolved = realpath(root.c_str(), nullptr);
+  if (resolved == nullptr) return false;
+  *absolute = resolved;
+  std::free(resolved);
+  setenv("ORVA_ROOT", absolute->c_str(), 1);
+  return true;
+}
+
 std::string TokenPath(const std::string& root) {
   return root + "/usr/orva/etc/webapi.token";
 }

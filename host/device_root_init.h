@@ -10,6 +10,11 @@
 // false with a message in *error, leaving what was made so far.
 bool InitDeviceRoot(const std::string& root, std::string* error);
 
+// Makes `root` absolute in *absolute and exports it as ORVA_ROOT, the
+// device root of the module and the system library. Returns false, with
+// nothing exported, when `root` does not exist.
+bool UseDeviceRoot(const std::string& root, std::string* absolute);
+
 // Path of the host's access token inside the device root `root`.
 std::string TokenPath(const std::string& root);
 

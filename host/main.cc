@@ -1,5 +1,5 @@
 // orva-webapi: provisions a device root, calls a certificate method from the
-// command line, and serves the methods over HTTP.
+// command line, and serves the methods over HTTP and HTTPS.
 
 #include <syslog.h>
 
@@ -14,7 +14,9 @@
 
 #include "host/api_call.h"
 #include "host/device_root_init.h"
+#include "host/listen_address.h"
 #include "host/module_loader.h"
+#include "host/serve_command.h"
 #include "host/temporary_uploads.h"
 
 namespace {
@@ -23,26 +25,13 @@ constexpr char kUsage[] =
     "usage:\n"
     "  orva-webapi init  --root DIR\n"
     "  orva-webapi call  --root DIR API METHOD [name=value ...] "
-    "[--upload NAME=PATH ...] [--output FILE]\n";
+    "[--upload NAME=PATH ...] [--output FILE]\n"
+    "  orva-webapi serve --root DIR [--listen HOST:PORT] "
+    "[--listen-https HOST:PORT] [--web DIR] [--module PATH ...]\n";
 
 int Usage() {
   std::fputs(kUsage, stderr);
   return 2;
-}
-
-// Makes `root` absolute and exports it as ORVA_ROOT for the module and the
-// system library.
-bool UseDeviceRoot(const std::string& root, std::string* absolute) {
-  char* resolved = realpath(root.c_str(), nullptr);
-  if (resolved == nullptr) {
-    std::fprintf(stderr, "orva-webapi: no device root at %s (run init)\n",
-                 root.c_str());
-    return false;
-  }
-  *absolute = resolved;
-  std::free(resolved);
-  setenv("ORVA_ROOT", absolute->c_str(), 1);
-  return true;
 }
 
 int RunInit(const std::string& root) {
@@ -106,7 +95,11 @@ int PrintOutcome(const CallOutcome& outcome, const std::string& output) {
 
 int RunCall(const std::string& root, const CallArguments& arguments) {
   std::string absolute_root;
-  if (!UseDeviceRoot(root, &absolute_root)) return 1;
+  if (!UseDeviceRoot(root, &absolute_root)) {
+    std::fprintf(stderr, "orva-webapi: no device root at %s (run init)\n",
+                 root.c_str());
+    return 1;
+  }
   for (const std::string& name : arguments.params.getMemberNames()) {
     if (IsHostOnlyParameter(name)) {
       std::printf("%s\n", ToOneLineJson(HostFailure(400).answer).c_str());
@@ -147,14 +140,31 @@ int main(int argc, char** argv) {
   std::string command = argv[1];
   std::string root;
   CallArguments call;
+  ServeOptions serve;
+  bool has_serve_options = false;
+  bool has_call_options = false;
   std::vector<std::string> positional;
   for (int i = 2; i < argc; ++i) {
     std::string argument = argv[i];
     bool has_value = i + 1 < argc;
+    if (argument == "--listen" || argument == "--listen-https" ||
+        argument == "--web" || argument == "--module") {
+      has_serve_options = true;
+    } else if (argument == "--output" || argument == "--upload") {
+      has_call_options = true;
+    }
     if (argument == "--root" && has_value) {
       root = argv[++i];
     } else if (argument == "--output" && has_value) {
       call.output = argv[++i];
+    } else if (argument == "--listen" && has_value) {
+      if (!ParseListenAddress(argv[++i], &serve.http)) return Usage();
+    } else if (argument == "--listen-https" && has_value) {
+      if (!ParseListenAddress(argv[++i], &serve.https)) return Usage();
+    } else if (argument == "--web" && has_value) {
+      serve.web = argv[++i];
+    } else if (argument == "--module" && has_value) {
+      serve.modules.push_back(argv[++i]);
     } else if (argument == "--upload" && has_value) {
       std::string name, path;
       if (!SplitPair(argv[++i], &name, &path)) return Usage();
@@ -164,6 +174,10 @@ int main(int argc, char** argv) {
     } else {
       positional.push_back(argument);
     }
+  }
+  if ((has_serve_options && command != "serve") ||
+      (has_call_options && command != "call")) {
+    return Usage();
   }
   if (command == "init" && positional.empty()) return RunInit(root);
   if (command == "call" && positional.size() >= 2 && !root.empty()) {
@@ -175,6 +189,10 @@ int main(int argc, char** argv) {
       call.params[name] = value;
     }
     return RunCall(root, call);
+  }
+  if (command == "serve" && positional.empty() && !root.empty()) {
+    serve.root = root;
+    return RunServe(serve);
   }
   return Usage();
 }

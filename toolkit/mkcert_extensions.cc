@@ -7,6 +7,7 @@
 
 #include "common/log.h"
 #include "toolkit/mkcert.h"
+#include "toolkit/mkcert_internal.h"
 #include "toolkit/store_file.h"
 
 namespace {
@@ -115,20 +116,10 @@ int generateServerCNF(const char* path, OLIBSZLIST* aliases) {
 
 int checkAliasText(const char* aliases) {
   if (aliases == nullptr) return 0;
-  OLIBSZLIST* list = OLIBCSzListAlloc(512);
-  if (list == nullptr) {
-    ORVA_LOG("Out of memory!! size=512");
-    return -1;
-  }
-  // OLIBCStrSep may move the list; ownership is taken back from `list`.
-  int separated = OLIBCStrSep(aliases, ";", &list);
-  OLIBSzListPtr owner(list);
-  if (separated == -1) {
-    ORVA_LOG("String separate failed.");
-    return -1;
-  }
-  for (uint32_t i = 0; i < owner->nItem; ++i) {
-    if (!IsAllowedAlias(OLIBCSzListGet(owner.get(), i))) {
+  OLIBSzListPtr names = SplitAliases(aliases);
+  if (!names) return -1;
+  for (uint32_t i = 0; i < names->nItem; ++i) {
+    if (!IsAllowedAlias(OLIBCSzListGet(names.get(), i))) {
       ORVA_LOG("Alias %u is neither a host name nor an IP address", i + 1);
       return -1;
     }

@@ -7,6 +7,7 @@
 #include <string>
 
 #include "common/store_paths.h"
+#include "platform/olib/olib_szlist.h"
 #include "platform/olib/orva_root.h"
 
 // What the toolkit's source files share and nobody else needs.
@@ -24,5 +25,9 @@ inline std::string OpensslTool() { return OrvaPath(kOpensslTool); }
 inline bool ToolExitedCleanly(int status) {
   return status != -1 && WIFEXITED(status) && WEXITSTATUS(status) == 0;
 }
+
+// The names of the ";"-separated `aliases`, in order, empty ones kept.
+// Null (logged) when the list cannot be made or split.
+OLIBSzListPtr SplitAliases(const char* aliases);
 
 #endif  // ORVA_TOOLKIT_MKCERT_INTERNAL_H_

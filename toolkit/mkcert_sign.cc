@@ -17,22 +17,28 @@ bool IsEmpty(const char* text) { return text == nullptr || *text == '\0'; }
 // Writes the server extension file from the ";"-separated `aliases`.
 // 0 or -1 (logged).
 int WriteServerExtensions(const char* extFile, const char* aliases) {
+  OLIBSzListPtr names = SplitAliases(aliases);
+  if (!names) return -1;
+  return generateServerCNF(extFile, names.get());
+}
+
+}  // namespace
+
+OLIBSzListPtr SplitAliases(const char* aliases) {
   OLIBSZLIST* list = OLIBCSzListAlloc(512);
   if (list == nullptr) {
     ORVA_LOG("Out of memory!! size=512");
-    return -1;
+    return nullptr;
   }
   // OLIBCStrSep may move the list; ownership is taken back from `list`.
   int separated = OLIBCStrSep(aliases, ";", &list);
   OLIBSzListPtr owner(list);
   if (separated == -1) {
     ORVA_LOG("String separate failed.");
-    return -1;
+    return nullptr;
   }
-  return generateServerCNF(extFile, owner.get());
+  return owner;
 }
-
-}  // namespace
 
 int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,
            const char* serialPath, const char* outputPath, const char* keyPath,

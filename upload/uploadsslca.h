@@ -66,8 +66,11 @@ class SSLCAFormHandler : public ServerFormHandler {
   // intermediate file holds certificates that issued the certificate, and
   // the key belongs to the certificate. Returns 5502 when the set is
   // acceptable, else the code of the first failed check: 5501, 5510, 5511,
-  // 5512, 5514, 5516, 5517 or 5518. An encrypted key is refused (5514)
-  // without asking anyone for a password. A leading UTF-8 byte order mark
+  // 5512, 5514, 5516, 5517 or 5518. Where the openssl tool cannot compare
+  // the pair, the library proves it instead (and refuses a DSA key it reads
+  // with 5518). An intermediate file that yields no certificate is refused
+  // (5517). An encrypted key is refused (5514) without asking anyone for a
+  // password. A leading UTF-8 byte order mark
   // is removed from the certificate and key files in place; nothing else
   // changes on disk. `data` is not touched.
   int checkCAContent(const char* cert, const char* key, const char* interCert,

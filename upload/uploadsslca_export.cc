@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "api/generation_area.h"
 #include "common/log.h"
 #include "common/shell_command.h"
 #include "common/store_paths.h"
@@ -13,8 +14,8 @@
 
 namespace {
 
-// Command lines of the export fit in this many bytes, terminating zero
-// included.
+// Command lines of the export fit in this many bytes on the device,
+// terminating zero included (see RootedCommandSize for other roots).
 constexpr size_t kExportCommandSize = 512;
 
 // Store files that the export can pack, as device paths.
@@ -50,14 +51,14 @@ bool FindExportSet(const std::string& choice, ExportSet* set) {
 
 int SSLCAFormHandler::CreateArchive(const char** files, const char* archive,
                                     int count) {
-  ShellCommand remove(kExportCommandSize);
+  ShellCommand remove(RootedCommandSize(kExportCommandSize));
   remove.Append("/bin/rm -rf %s", {archive});
   if (RunShellCommand(remove) != 0) {
     ORVA_LOG_LASTERR("Remove previous archive failed");
     return -1;
   }
 
-  ShellCommand pack(kExportCommandSize);
+  ShellCommand pack(RootedCommandSize(kExportCommandSize));
   pack.Append("%s a %s", {OrvaPath(k7zTool), archive});
   int packed = 0;
   for (int i = 0; i < count; ++i) {
@@ -90,6 +91,9 @@ void SSLCAFormHandler::DownloadAction(ORVA::APIRequest* request,
   std::vector<const char*> files;
   for (const std::string& path : paths) files.push_back(path.c_str());
   const std::string archivePath = OrvaPath(kArchivePath);
+  // The archive tool would make a missing generation area with the default
+  // mode; it holds keys, so it is made private first.
+  MakeGenerationArea();  // Ignoring errors: CreateArchive reports them.
   if (CreateArchive(files.data(), archivePath.c_str(),
                     static_cast<int>(files.size())) < 0) {
     ORVA_LOG_LASTERR("Create archive failed");

@@ -1,0 +1,99 @@
+// The real certificate module over HTTP and HTTPS: a local CA set made,
+// an outside set imported, refused and exported, and what a TLS handshake
+// presents after each change.
+
+#include <chrono>
+#include <string>
+#include <thread>
+
+#include <gtest/gtest.h>
+
+#include "host/device_root_init.h"
+#include "tests/host/serve_process.h"
+#include "tests/host/tls_probe.h"
+#include "tests/support/certificates.h"
+#include "tests/support/test_support.h"
+
+namespace {
+
+constexpr char kServerCrt[] = "/usr/orva/etc/ssl/ssl.crt/server.crt";
+constexpr char kServerKey[] = "/usr/orva/etc/ssl/ssl.key/server.key";
+
+// Polls handshakes for up to 10 s until one presents `commonName`.
+PresentedCertificates ProbeFor(int port, const std::string& commonName) {
+  auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+  PresentedCertificates seen = ProbeTls(port);
+  while (seen.common_name != commonName && std::chrono::steady_clock::now() < deadline) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(20));
+    seen = ProbeTls(port);
+  }
+  return seen;
+}
+
+httplib::MultipartFormDataItems ImportForm(const std::string& cert, const std::string& key,
+                                           const std::string& chain) {
+  return {{"api", "ORVA.Core.Certificate", "", ""},
+          {"method", "import", "", ""},
+          {"cert", cert, "server.crt", "application/x-pem-file"},
+          {"key", key, "server.key", "application/x-pem-file"},
+          {"inter_cert", chain, "chain.crt", "application/x-pem-file"}};
+}
+
+}  // namespace
+
+TEST(ServeCertificateLife, CreateImportRefuseAndExportOverHttpChangeWhatHttpsPresents) {
+  TempDeviceRoot root;
+  std::string error;
+  ASSERT_TRUE(InitDeviceRoot(root.root(), &error)) << error;
+  root.WriteFile("/usr/orva/etc/orva.conf", "runHTTPS=\"yes\"\nrunWebHTTPS=\"no\"\n");
+  ASSERT_TRUE(MakeSelfSignedCa(root.Path(kServerKey), root.Path(kServerCrt), "/CN=factory.local"));
+  ServeProcess server(root.root());
+  ASSERT_TRUE(server.started()) << server.Log();
+  ASSERT_GT(server.https_port(), 0) << server.Log();
+  EXPECT_EQ("factory.local", ProbeTls(server.https_port()).common_name);
+  httplib::Client client = server.AuthorizedClient();
+
+  httplib::Params create = {{"api", "ORVA.Core.Certificate.CRT"}, {"method", "create"},
+                            {"alias", "nas.local;10.1.2.3"}};
+  for (const char* field : {"country", "state", "city", "organization", "department",
+                            "common_name", "email"}) {
+    std::string value = std::string(field) == "country" ? "TW" : "nas.local";
+    create.emplace(field, value);
+    create.emplace(std::string("ca_") + field, value);
+  }
+  auto created = client.Post("/webapi", create);
+  ASSERT_TRUE(created);
+  EXPECT_EQ("{\"data\":{\"restart_httpd\":true},\"success\":true}", created->body);
+  EXPECT_EQ("nas.local", ProbeFor(server.https_port(), "nas.local").common_name);
+
+  const std::string work = root.Path("/outside");
+  ASSERT_TRUE(MakeSelfSignedCa(work + "/root.key", work + "/root.crt", "/CN=Outside Root"));
+  ASSERT_TRUE(MakeSignedCertificate(work + "/root.key", work + "/root.crt", work + "/inter.key",
+                                    work + "/inter.crt", "/CN=Outside Intermediate"));
+  ASSERT_TRUE(MakeSignedCertificate(work + "/inter.key", work + "/inter.crt", work + "/srv.key",
+                                    work + "/srv.crt", "/CN=imported.example"));
+  auto imported = client.Post("/webapi", ImportForm(ReadFile(work + "/srv.crt"),
+                                                    ReadFile(work + "/srv.key"),
+                                                    ReadFile(work + "/inter.crt")));
+  ASSERT_TRUE(imported);
+  EXPECT_EQ("{\"data\":{\"restart_httpd\":true},\"success\":true}", imported->body);
+  PresentedCertificates presented = ProbeFor(server.https_port(), "imported.example");
+  EXPECT_EQ("imported.example", presented.common_name);
+  EXPECT_EQ(2, presented.chain_length);
+  EXPECT_EQ("Outside Intermediate", presented.chain_top_name);
+
+  auto refused = client.Post("/webapi", ImportForm(ReadFile(work + "/srv.crt"),
+                                                   ReadFile(work + "/inter.key"),
+                                                   ReadFile(work + "/inter.crt")));
+  ASSERT_TRUE(refused);
+  EXPECT_EQ("{\"error\":{\"code\":5514},\"success\":false}", refused->body);
+  EXPECT_EQ(ReadFile(work + "/srv.key"), ReadFile(root.Path(kServerKey)));
+
+  auto exported = client.Get("/webapi?api=ORVA.Core.Certificate&method=export&file=archive");
+  ASSERT_TRUE(exported);
+  EXPECT_EQ(200, exported->status);
+  EXPECT_EQ("attachment; filename=\"archive.zip\"",
+            exported->get_header_value("content-disposition"));
+  EXPECT_EQ(0u, exported->body.rfind("PK\x03\x04", 0)) << "a ZIP archive";
+  EXPECT_EQ(0, CountFiles(server.UploadFolder())) << "uploads are removed after each call";
+}
