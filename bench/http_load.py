@@ -1,17 +1,22 @@
 """The host's HTTP server under load: "list" next to a static file of the same
 size from the same server, with wrk, and the server's resident memory."""
 
+import http.client
 import os
 import re
 import shutil
 import socket
 import subprocess
+import threading
 import time
+import urllib.parse
 import urllib.request
 
 from measure import RunFailed
 
-LIST_QUERY = "/webapi?api=ORVA.Core.Certificate&method=list"
+LIST_QUERY = "/webapi?" + urllib.parse.urlencode({
+    "api": "ORVA.Core.Certificate", "method": "list",
+    "additional": '["valid_from","valid_till"]'})
 STATIC_NAME = "list.json"
 _WRK_LINE = re.compile(r"ORVA_BENCH (.*)")
 
@@ -85,6 +90,36 @@ class Server:
     def resident_kib(self):
         return resident_kib(self.process.pid)
 
+    def send_requests(self, path, count, clients):
+        """Sends exactly `count` GET requests for `path` over `clients` kept-alive
+        connections side by side; every answer must be 200."""
+        failures = []
+        shares = [count // clients + (1 if i < count % clients else 0) for i in range(clients)]
+
+        def client(share):
+            connection = http.client.HTTPConnection("127.0.0.1", self.port, timeout=30)
+            headers = {"Authorization": "Bearer " + self.token}
+            try:
+                for _ in range(share):
+                    connection.request("GET", path, headers=headers)
+                    answer = connection.getresponse()
+                    answer.read()
+                    if answer.status != 200:
+                        failures.append(answer.status)
+                        return
+            except OSError as error:
+                failures.append(str(error))
+            finally:
+                connection.close()
+
+        threads = [threading.Thread(target=client, args=(share,)) for share in shares]
+        for thread in threads:
+            thread.start()
+        for thread in threads:
+            thread.join()
+        if failures:
+            raise RunFailed("requests failed: %s" % failures[:5])
+
     def stop(self):
         self.process.terminate()
         try:
@@ -107,13 +142,11 @@ class Load:
         self.errors = int(fields["status_errors"]) + int(fields["socket_errors"])
 
 
-def wrk(url, token, clients, seconds, script, requests_per_thread=None):
+def wrk(url, token, clients, seconds, script):
     """One wrk run; at most two threads, as the machine has two cores."""
     program = shutil.which("wrk")
     threads = min(clients, 2)
     env = dict(os.environ, ORVA_BENCH_TOKEN=token)
-    if requests_per_thread:
-        env["ORVA_BENCH_REQUESTS"] = str(requests_per_thread)
     out = subprocess.run([program, "-t%d" % threads, "-c%d" % clients, "-d%ds" % seconds,
                           "--timeout", "10s", "-s", script, url],
                          env=env, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE,

@@ -121,7 +121,7 @@ def http_rows(table, http):
     memory = http["memory"]
     idle, first, second = memory["idle"], memory["after_first"], memory["after_second"]
     growth = second - first
-    table.add("| Resident memory | idle | after %d list requests | after %d more | "
+    table.add("| Resident memory | idle | after %d list requests (8 connections) | after %d more | "
               "growth over the second lot | Goal | Met |" % (memory["lot"], memory["lot"]))
     table.add("|---|---|---|---|---|---|---|")
     table.add("| `orva-webapi serve` | %.1f MiB | %.1f MiB | %.1f MiB | %+.0f KiB | idle < 20 MiB, "
