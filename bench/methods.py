@@ -7,7 +7,7 @@ import shutil
 import subprocess
 
 import floors
-from measure import RunFailed, timed_run
+from measure import timed_run
 
 CA_SUBJECT = {
     "ca_country": "DE", "ca_state": "Berlin", "ca_city": "Berlin",
@@ -82,7 +82,7 @@ class Device:
 
 class Method:
     """One row of the method table. `call` and `floor` take no argument and
-    return a Sample; `before_floor` runs untimed before every floor run."""
+    return a Sample; `argv` and `floor_argv` start one run of each side."""
 
     def __init__(self, name, argv, call, floor_argv, floor, goal=True, note=""):
         self.name = name
@@ -190,7 +190,7 @@ def build(device, files, ca_bits, server_bits):
     ]
 
 
-def check_same_commands(device, method):
+def check_same_commands(method):
     """'same', 'differ: ...', or 'unchecked' without strace. Runs each side once
     under a trace; the method's run changes the store as any run does."""
     ours = floors.traced_tool_commands(method.argv)
@@ -208,6 +208,3 @@ def _in_order(commands):
     digests are counted, everything else is compared in order."""
     digests = [c for c in commands if c.endswith(" md5")]
     return [c for c in commands if not c.endswith(" md5")], len(digests)
-
-
-__all__ = ["Device", "Method", "prepare", "build", "check_same_commands", "RunFailed"]
