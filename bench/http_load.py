@@ -6,6 +6,7 @@ import os
 import re
 import shutil
 import socket
+import statistics
 import subprocess
 import threading
 import time
@@ -140,6 +141,16 @@ class Load:
         self.p50_ms = int(fields["p50_us"]) / 1000.0
         self.p99_ms = int(fields["p99_us"]) / 1000.0
         self.errors = int(fields["status_errors"]) + int(fields["socket_errors"])
+
+
+class MedianLoad:
+    """The median of each figure over several wrk runs of the same load."""
+
+    def __init__(self, loads):
+        self.runs = len(loads)
+        self.per_second = statistics.median(load.per_second for load in loads)
+        self.p50_ms = statistics.median(load.p50_ms for load in loads)
+        self.p99_ms = statistics.median(load.p99_ms for load in loads)
 
 
 def wrk(url, token, clients, seconds, script):

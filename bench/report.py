@@ -101,8 +101,9 @@ def http_rows(table, http):
         table.add("Not measured: %s" % http["failed"])
         table.add()
         return
-    table.add("wrk over loopback, %d s per run, one connection per client. Static: the "
-              "list answer's bytes as a file from the same server (`--web`)." % http["seconds"])
+    table.add("wrk over loopback, one connection per client; each figure is the median of "
+              "%d runs of %d s, list and static alternating. Static: the list answer's bytes "
+              "as a file from the same server (`--web`)." % (http["rounds"], http["seconds"]))
     table.add()
     table.add("| Clients | list req/s | list p50 ms | list p99 ms | static req/s | static p50 ms "
               "| static p99 ms | list/static throughput | Goal | Met |")
