@@ -1,7 +1,5 @@
-#include <sys/wait.h>
+// "orva-webapi init" and "orva-webapi call" as a shell runs them.
 
-#include <cstdio>
-#include <memory>
 #include <string>
 
 #include <gtest/gtest.h>
@@ -11,68 +9,45 @@
 
 namespace {
 
-struct ProcessResult {
-  int exit_code;
-  std::string output;
-};
-
-// Runs orva-webapi with `arguments` (already quoted for the shell).
-ProcessResult RunHost(const std::string& arguments) {
-  std::string command = std::string(ORVA_WEBAPI_PATH) + " " + arguments + " 2>/dev/null";
-  ProcessResult result{-1, ""};
-  FILE* pipe = popen(command.c_str(), "r");
-  if (pipe == nullptr) return result;
-  char buffer[4096];
-  size_t got;
-  while ((got = fread(buffer, 1, sizeof(buffer), pipe)) > 0) result.output.append(buffer, got);
-  int status = pclose(pipe);
-  result.exit_code = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-  return result;
+// Runs orva-webapi with `arguments` (quoted for the shell) and returns its
+// standard output followed by "exit N".
+std::string RunHost(const TempDeviceRoot& scratch, const std::string& arguments) {
+  const std::string out = scratch.Path("/host.out");
+  RunForTest("(" + std::string(ORVA_WEBAPI_PATH) + " " + arguments + " >'" + out +
+             "'; echo \"exit $?\" >>'" + out + "')");
+  return ReadFile(out);
 }
 
 }  // namespace
 
-TEST(OrvaWebapiCall, InitThenListAnswersFromTheDeviceRoot) {
+TEST(OrvaWebapiCall, InitMakesAPrivateTokenOnceAndCallAnswersFromTheDeviceRoot) {
   TempDeviceRoot scratch;
-  std::string root = scratch.Path("/device");
-  ASSERT_EQ(0, RunHost("init --root '" + root + "'").exit_code);
-  EXPECT_EQ(0600, FileMode(root + "/usr/orva/etc/webapi.token"));
-  EXPECT_NE(std::string::npos,
-            ReadFile(root + "/usr/orva/etc/orva.conf").find("runHTTPS=\"no\""));
-  std::string token = ReadFile(root + "/usr/orva/etc/webapi.token");
-  ASSERT_EQ(0, RunHost("init --root '" + root + "'").exit_code);
-  EXPECT_EQ(token, ReadFile(root + "/usr/orva/etc/webapi.token")) << "init never overwrites";
+  const std::string root = "--root '" + scratch.Path("/device") + "'";
+  const std::string token_file = scratch.Path("/device/usr/orva/etc/webapi.token");
+  ASSERT_NE(std::string::npos, RunHost(scratch, "init " + root).find("\nexit 0\n"));
+  EXPECT_EQ(0600, FileMode(token_file));
+  const std::string token = ReadFile(token_file);
+  ASSERT_NE(std::string::npos, RunHost(scratch, "init " + root).find("\nexit 0\n"));
+  EXPECT_EQ(token, ReadFile(token_file)) << "init never overwrites";
 
-  ProcessResult empty = RunHost("call --root '" + root + "' ORVA.Core.Certificate list");
-  EXPECT_EQ(1, empty.exit_code);
-  EXPECT_EQ("{\"error\":{\"code\":5504},\"success\":false}\n", empty.output);
+  const struct {
+    const char* call;
+    const char* answer;
+  } cases[] = {
+      {"ORVA.Core.Certificate list", "{\"error\":{\"code\":5504},\"success\":false}\nexit 1\n"},
+      {"ORVA.Core.Certificate import cert_tmp=/etc/passwd key_tmp=/x",
+       "{\"error\":{\"code\":400},\"success\":false}\nexit 1\n"},
+      {"ORVA.Core.Certificate delete", "{\"error\":{\"code\":404},\"success\":false}\nexit 1\n"},
+  };
+  for (const auto& c : cases) EXPECT_EQ(c.answer, RunHost(scratch, "call " + root + " " + c.call));
+  EXPECT_EQ("exit 1\n", RunHost(scratch, "call --root '" + scratch.Path("/nowhere") +
+                                             "' ORVA.Core.Certificate list"));
 
-  const std::string ssl = root + "/usr/orva/etc/ssl";
-  ASSERT_TRUE(MakeSelfSignedCa(ssl + "/ssl.key/ca.key", ssl + "/ssl.crt/ca.crt", "/CN=Root"));
-  ASSERT_TRUE(MakeSignedCertificate(ssl + "/ssl.key/ca.key", ssl + "/ssl.crt/ca.crt",
-                                    ssl + "/ssl.key/server.key", ssl + "/ssl.crt/server.crt",
-                                    "/CN=nas.local"));
-  ProcessResult listed = RunHost("call --root '" + root +
-                                 "' ORVA.Core.Certificate list 'additional=[\"valid_from\"]'");
-  EXPECT_EQ(0, listed.exit_code) << listed.output;
-  EXPECT_NE(std::string::npos, listed.output.find("\"success\":true"));
-  EXPECT_NE(std::string::npos, listed.output.find("\"valid_from\""));
-  EXPECT_NE(std::string::npos, listed.output.find("\"type\":\"root_cert\""));
-}
-
-TEST(OrvaWebapiCall, HostRefusesClientNamedFilesAndUnknownMethods) {
-  TempDeviceRoot scratch;
-  std::string root = scratch.Path("/device");
-  ASSERT_EQ(0, RunHost("init --root '" + root + "'").exit_code);
-
-  ProcessResult named = RunHost("call --root '" + root +
-                                "' ORVA.Core.Certificate import cert_tmp=/etc/passwd key_tmp=/x");
-  EXPECT_EQ(1, named.exit_code);
-  EXPECT_EQ("{\"error\":{\"code\":400},\"success\":false}\n", named.output);
-
-  ProcessResult unknown = RunHost("call --root '" + root + "' ORVA.Core.Certificate delete");
-  EXPECT_EQ("{\"error\":{\"code\":404},\"success\":false}\n", unknown.output);
-
-  EXPECT_EQ(1, RunHost("call --root '" + scratch.Path("/nowhere") +
-                       "' ORVA.Core.Certificate list").exit_code);
+  const std::string ssl = scratch.Path("/device/usr/orva/etc/ssl");
+  ASSERT_TRUE(MakeSelfSignedCa(ssl + "/ssl.key/server.key", ssl + "/ssl.crt/server.crt",
+                               "/CN=nas.local"));
+  std::string listed =
+      RunHost(scratch, "call " + root + " ORVA.Core.Certificate list type=server_cert");
+  EXPECT_NE(std::string::npos, listed.find("\"common_name\":\"nas.local\"")) << listed;
+  EXPECT_EQ(listed.size() - 8, listed.find("\nexit 0\n")) << listed;
 }

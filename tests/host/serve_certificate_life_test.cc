@@ -1,10 +1,8 @@
 // The real certificate module over HTTP and HTTPS: a local CA set made,
-// an outside set imported, refused and exported, and what a TLS handshake
-// presents after each change.
+// an outside set imported, listed, refused and exported, and what a TLS
+// handshake presents after each change.
 
-#include <chrono>
 #include <string>
-#include <thread>
 
 #include <gtest/gtest.h>
 
@@ -19,15 +17,11 @@ namespace {
 constexpr char kServerCrt[] = "/usr/orva/etc/ssl/ssl.crt/server.crt";
 constexpr char kServerKey[] = "/usr/orva/etc/ssl/ssl.key/server.key";
 
-// Polls handshakes for up to 10 s until one presents `commonName`.
+// The first handshake within 10 s that presents `commonName`.
 PresentedCertificates ProbeFor(int port, const std::string& commonName) {
-  auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
-  PresentedCertificates seen = ProbeTls(port);
-  while (seen.common_name != commonName && std::chrono::steady_clock::now() < deadline) {
-    std::this_thread::sleep_for(std::chrono::milliseconds(20));
-    seen = ProbeTls(port);
-  }
-  return seen;
+  return ProbeTlsUntil(port, [&](const PresentedCertificates& seen) {
+    return seen.common_name == commonName;
+  });
 }
 
 httplib::MultipartFormDataItems ImportForm(const std::string& cert, const std::string& key,
@@ -81,6 +75,15 @@ TEST(ServeCertificateLife, CreateImportRefuseAndExportOverHttpChangeWhatHttpsPre
   EXPECT_EQ("imported.example", presented.common_name);
   EXPECT_EQ(2, presented.chain_length);
   EXPECT_EQ("Outside Intermediate", presented.chain_top_name);
+  for (const char* type : {"server_cert", "inter_cert"}) {
+    auto listed = client.Get(
+        (std::string("/webapi?api=ORVA.Core.Certificate&method=list&type=") + type).c_str());
+    ASSERT_TRUE(listed);
+    Json::Value entry = ParseJson(listed->body)["data"]["certificates"][0];
+    EXPECT_EQ(type, entry["type"].asString()) << listed->body;
+    EXPECT_EQ(std::string(type) == "server_cert" ? "imported.example" : "Outside Intermediate",
+              entry["subject"]["common_name"].asString());
+  }
 
   auto refused = client.Post("/webapi", ImportForm(ReadFile(work + "/srv.crt"),
                                                    ReadFile(work + "/inter.key"),
@@ -94,6 +97,9 @@ TEST(ServeCertificateLife, CreateImportRefuseAndExportOverHttpChangeWhatHttpsPre
   EXPECT_EQ(200, exported->status);
   EXPECT_EQ("attachment; filename=\"archive.zip\"",
             exported->get_header_value("content-disposition"));
+  EXPECT_EQ("application/zip", exported->get_header_value("Content-Type"));
+  EXPECT_TRUE(ReadFile(root.Path("/usr/orva/etc/ssl/.gen/archive.zip")) == exported->body)
+      << "the archive byte for byte";
   EXPECT_EQ(0u, exported->body.rfind("PK\x03\x04", 0)) << "a ZIP archive";
   EXPECT_EQ(0, CountFiles(server.UploadFolder())) << "uploads are removed after each call";
 }

@@ -1,7 +1,6 @@
 #include "tests/host/serve_process.h"
 
 #include <arpa/inet.h>
-#include <dirent.h>
 #include <netinet/in.h>
 #include <poll.h>
 #include <sys/socket.h>
@@ -12,7 +11,7 @@
 #include <unistd.h>
 
 #include <chrono>
-#include <cstring>
+#include <filesystem>
 #include <fstream>
 #include <memory>
 #include <sstream>
@@ -20,8 +19,6 @@
 
 #include "host/device_root_init.h"
 #include "tests/support/test_support.h"
-
-extern char** environ;
 
 namespace {
 
@@ -38,35 +35,21 @@ int PortOnLine(const std::string& output, const std::string& label) {
   return 0;
 }
 
-bool WaitForExit(pid_t pid, int* status, std::chrono::milliseconds limit) {
-  auto deadline = std::chrono::steady_clock::now() + limit;
-  while (std::chrono::steady_clock::now() < deadline) {
-    if (waitpid(pid, status, WNOHANG) == pid) return true;
-    std::this_thread::sleep_for(std::chrono::milliseconds(10));
-  }
-  return false;
-}
-
 }  // namespace
 
 ServeProcess::ServeProcess(const std::string& root,
                            const std::vector<std::string>& arguments)
     : root_(root) {
   MakeDirs(UploadFolder());
-  std::vector<std::string> words = {ORVA_WEBAPI_PATH, "serve", "--root", root,
+  // Uploads go where TMPDIR points; env sets it for the server alone.
+  std::vector<std::string> words = {"/usr/bin/env", "TMPDIR=" + UploadFolder(),
+                                    ORVA_WEBAPI_PATH, "serve", "--root", root,
                                     "--listen", "127.0.0.1:0", "--listen-https",
                                     "127.0.0.1:0", "--module", ORVA_TEST_MODULE_PATH};
   words.insert(words.end(), arguments.begin(), arguments.end());
   std::vector<char*> argv;
   for (std::string& word : words) argv.push_back(&word[0]);
   argv.push_back(nullptr);
-  std::vector<std::string> environment_texts = {"TMPDIR=" + UploadFolder()};
-  for (char** entry = environ; *entry != nullptr; ++entry) {
-    if (std::strncmp(*entry, "TMPDIR=", 7) != 0) environment_texts.push_back(*entry);
-  }
-  std::vector<char*> environment;
-  for (std::string& text : environment_texts) environment.push_back(&text[0]);
-  environment.push_back(nullptr);
   std::string out_path = root_ + "/serve.out";
   std::string err_path = root_ + "/serve.err";
   // A server started before on this root must not be taken for this one.
@@ -81,7 +64,7 @@ ServeProcess::ServeProcess(const std::string& root,
     if (out < 0 || err < 0 || dup2(out, STDOUT_FILENO) < 0 || dup2(err, STDERR_FILENO) < 0) {
       _exit(127);
     }
-    execve(argv[0], argv.data(), environment.data());
+    execv(argv[0], argv.data());
     _exit(127);
   }
   if (pid_ < 0) return;
@@ -110,11 +93,15 @@ int ServeProcess::Stop(int signalNumber) {
   if (pid_ <= 0) return -1;
   kill(pid_, signalNumber);
   int status = 0;
-  if (!WaitForExit(pid_, &status, std::chrono::seconds(10))) {
-    kill(pid_, SIGKILL);
-    waitpid(pid_, &status, 0);
-    pid_ = -1;
-    return -1;
+  auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+  while (waitpid(pid_, &status, WNOHANG) != pid_) {
+    if (std::chrono::steady_clock::now() > deadline) {
+      kill(pid_, SIGKILL);
+      waitpid(pid_, &status, 0);
+      pid_ = -1;
+      return -1;
+    }
+    std::this_thread::sleep_for(std::chrono::milliseconds(10));
   }
   pid_ = -1;
   return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
@@ -146,16 +133,9 @@ long ServeProcess::ResidentKib() const {
 }
 
 int CountFiles(const std::string& folder) {
-  DIR* directory = opendir(folder.c_str());
-  if (directory == nullptr) return -1;
-  int count = 0;
-  while (struct dirent* entry = readdir(directory)) {
-    if (std::strcmp(entry->d_name, ".") != 0 && std::strcmp(entry->d_name, "..") != 0) {
-      ++count;
-    }
-  }
-  closedir(directory);
-  return count;
+  std::error_code error;
+  std::filesystem::directory_iterator entries(folder, error);
+  return error ? -1 : static_cast<int>(std::distance(entries, {}));
 }
 
 namespace {

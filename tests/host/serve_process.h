@@ -26,7 +26,6 @@ class ServeProcess {
   ServeProcess& operator=(const ServeProcess&) = delete;
 
   bool started() const { return http_port_ > 0; }
-  pid_t pid() const { return pid_; }
   int http_port() const { return http_port_; }
   // 0 when the server printed no HTTPS URL.
   int https_port() const { return https_port_; }

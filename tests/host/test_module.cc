@@ -12,6 +12,7 @@
 #include <stdexcept>
 #include <thread>
 
+#include "host/api_call.h"
 #include "platform/olib/orva_root.h"
 #include "platform/webapi/api_download.h"
 #include "platform/webapi/api_table.h"
@@ -87,6 +88,8 @@ const ORVA::APIEntry kTable[] = {
     {"ORVA.Test", 1, "hold", Hold},
     {"ORVA.Test", 1, "restart", AskForRestart},
 };
+static_assert(sizeof(kTable) / sizeof(kTable[0]) == kModuleApiCount,
+              "the host reads exactly this many rows of a module's table");
 
 }  // namespace
 

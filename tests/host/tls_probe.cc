@@ -3,7 +3,9 @@
 #include <openssl/ssl.h>
 #include <openssl/x509.h>
 
+#include <chrono>
 #include <memory>
+#include <thread>
 
 #include "common/raii.h"
 
@@ -51,5 +53,16 @@ PresentedCertificates ProbeTls(int port) {
     presented.chain_top_name = CommonName(sk_X509_value(chain, sk_X509_num(chain) - 1));
   }
   SSL_shutdown(ssl.get());
+  return presented;
+}
+
+PresentedCertificates ProbeTlsUntil(
+    int port, const std::function<bool(const PresentedCertificates&)>& done) {
+  auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+  PresentedCertificates presented = ProbeTls(port);
+  while (!done(presented) && std::chrono::steady_clock::now() < deadline) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(20));
+    presented = ProbeTls(port);
+  }
   return presented;
 }

@@ -1,0 +1,107 @@
+// Starts the page: asks for the access token when none is kept, shows the
+// installed certificates and binds the action forms.
+
+import { bindActionForm } from './action_form.js';
+import { BUSY_TEXTS, actionRuns } from './actions.js';
+import { renderCertificates } from './cert_table.js';
+import { loadInstalledCertificates } from './certificate_list.js';
+import { describeError } from './messages.js';
+import { buildSubjectFields } from './subject_fields.js';
+import { TokenGate } from './token_gate.js';
+import { WebApi } from './webapi.js';
+
+const RESTART_RETRY_DELAY_MS = 2000;
+const RESTART_RETRIES = 5;
+
+const byId = (id) => document.getElementById(id);
+const sleep = (ms) => new Promise((resolve) => { setTimeout(resolve, ms); });
+
+const tokens = new TokenGate({
+  gate: byId('token-gate'),
+  form: byId('token-form'),
+  input: byId('token-input'),
+  reason: byId('token-reason'),
+  app: byId('main'),
+  forgetButton: byId('forget-token'),
+});
+const api = new WebApi(tokens);
+
+const table = byId('certificate-table');
+const tableSection = table.closest('section');
+const tableMessage = byId('table-message');
+const emptyStore = byId('empty-store');
+const pageNotice = byId('page-notice');
+
+// Shows the installed certificates. `retries`: how often to try again when
+// the device does not answer (its web server may be restarting).
+async function refreshTable(retries = 0) {
+  tableSection.setAttribute('aria-busy', 'true');
+  tableMessage.dataset.tone = 'busy';
+  tableMessage.textContent = 'Reading the installed certificates…';
+  try {
+    for (let attempt = 0; ; attempt += 1) {
+      try {
+        const entries = await loadInstalledCertificates(api);
+        renderCertificates(table.tBodies[0], entries);
+        table.hidden = entries.length === 0;
+        emptyStore.hidden = entries.length !== 0;
+        tableMessage.textContent = '';
+        delete tableMessage.dataset.tone;
+        return;
+      } catch (error) {
+        if (error?.kind !== 'network' || attempt >= retries) throw error;
+        await sleep(RESTART_RETRY_DELAY_MS);
+      }
+    }
+  } catch (error) {
+    tableMessage.dataset.tone = 'error';
+    tableMessage.textContent = describeError(error, 'list');
+  } finally {
+    tableSection.setAttribute('aria-busy', 'false');
+  }
+}
+
+// Called after a new certificate is installed: tells what restarted and
+// shows the new table. Returns the sentence for the form.
+function installed(data) {
+  pageNotice.hidden = true;
+  if (data?.restart_httpd === true) {
+    pageNotice.textContent = 'The management web server is restarting with the new ' +
+      'certificate. If the page stops answering, wait a moment and reload it; the browser ' +
+      'may ask you to trust the new certificate.';
+    pageNotice.hidden = false;
+    sleep(RESTART_RETRY_DELAY_MS).then(() => refreshTable(RESTART_RETRIES));
+    return 'The device’s secure services restarted with it, and the management web server ' +
+      'is restarting with it too.';
+  }
+  refreshTable();
+  return 'The device’s secure services restarted with it.';
+}
+
+function openAction(id) {
+  const details = byId(id);
+  if (details === null) return;
+  details.open = true;
+  details.querySelector('summary').focus();
+}
+
+buildSubjectFields(document, byId('subject-fields'));
+
+const runs = actionRuns(api, installed);
+for (const form of document.querySelectorAll('form[data-action]')) {
+  const action = form.dataset.action;
+  bindActionForm(form, runs[action], BUSY_TEXTS[action]);
+}
+
+for (const link of document.querySelectorAll('[data-open-action]')) {
+  link.addEventListener('click', (event) => {
+    event.preventDefault();
+    openAction(link.dataset.openAction);
+    byId(link.dataset.openAction).scrollIntoView({ block: 'start' });
+  });
+}
+
+byId('refresh-table').addEventListener('click', () => refreshTable());
+byId('forget-token').addEventListener('click', () => tokens.forget().then(() => refreshTable()));
+
+refreshTable();

@@ -1,0 +1,99 @@
+// The device's web API: one POST to /webapi per call, with the access token
+// as a bearer token. A refused token (401) asks for a new one and sends the
+// same request again.
+
+const ENDPOINT = '/webapi';
+const VERSION = '1';
+
+// Why a call failed. `kind` is 'module' (the method answered an error code),
+// 'host' (the server refused the request; `code` is the HTTP status),
+// 'network' (no answer arrived) or 'answer' (an answer the page cannot read).
+export class ApiError extends Error {
+  constructor(kind, code = 0) {
+    super(kind === 'network' ? 'no answer' : `error ${code}`);
+    this.name = 'ApiError';
+    this.kind = kind;
+    this.code = code;
+  }
+}
+
+// Builds the request body. Parameters travel as form fields; `files` maps a
+// parameter name to a File and makes the body multipart (the server stores
+// each part and hands its path to the method).
+function requestBody(api, method, params, files) {
+  const fields = { api, method, version: VERSION, ...params };
+  const entries = Object.entries(files).filter(([, file]) => file);
+  if (entries.length === 0) return new URLSearchParams(fields);
+  const form = new FormData();
+  for (const [name, value] of Object.entries(fields)) form.append(name, value);
+  for (const [name, file] of entries) form.append(name, file, file.name);
+  return form;
+}
+
+async function readAnswer(response) {
+  let answer = null;
+  try {
+    answer = await response.json();
+  } catch {
+    // Not JSON: judged by the HTTP status below.
+  }
+  if (answer !== null && answer.success === true) return answer.data ?? null;
+  const code = answer?.success === false ? answer.error?.code : undefined;
+  if (Number.isInteger(code)) throw new ApiError(response.ok ? 'module' : 'host', code);
+  if (!response.ok) throw new ApiError('host', response.status);
+  throw new ApiError('answer');
+}
+
+function offeredFileName(disposition) {
+  const match = /filename="([^"]*)"/i.exec(disposition) || /filename=([^;]+)/i.exec(disposition);
+  const name = match ? match[1].trim() : '';
+  return name !== '' ? name : 'download';
+}
+
+export class WebApi {
+  // `tokens`: current() gives the token in use ('' when none); request(reason,
+  // staleToken) resolves with a token to try.
+  constructor(tokens) {
+    this.tokens = tokens;
+  }
+
+  // Resolves with the method's data; rejects with an ApiError.
+  async call(api, method, params = {}, files = {}) {
+    const response = await this.send(requestBody(api, method, params, files));
+    return readAnswer(response);
+  }
+
+  // Asks the export method for a set ("archive", "csr_set", "signed_set").
+  // Resolves with { blob, fileName }; rejects with an ApiError when the
+  // device sends no file.
+  async download(set) {
+    const response = await this.send(
+      requestBody('ORVA.Core.Certificate', 'export', { file: set }, {}));
+    const disposition = response.headers.get('content-disposition') || '';
+    if (response.ok && /attachment/i.test(disposition)) {
+      return { blob: await response.blob(), fileName: offeredFileName(disposition) };
+    }
+    await readAnswer(response);
+    throw new ApiError('answer');
+  }
+
+  async send(body) {
+    let token = this.tokens.current() || (await this.tokens.request('missing'));
+    for (;;) {
+      let response;
+      try {
+        response = await fetch(ENDPOINT, {
+          method: 'POST',
+          headers: { Authorization: `Bearer ${token}` },
+          body,
+          cache: 'no-store',
+          credentials: 'omit',
+        });
+      } catch {
+        throw new ApiError('network');
+      }
+      if (response.status !== 401) return response;
+      token = await this.tokens.request('refused', token);
+    }
+  }
+}
