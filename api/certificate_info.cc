@@ -2,11 +2,11 @@
 
 #include <openssl/bio.h>
 #include <openssl/objects.h>
-#include <openssl/pem.h>
 
 #include <cstdio>
+#include <memory>
 
-#include "common/pem_password.h"
+#include "api/certificate_facts.h"
 #include "common/raii.h"
 #include "common/store_paths.h"
 #include "platform/olib/orva_root.h"
@@ -27,6 +27,20 @@ const NameAttribute kNameAttributes[] = {
     {"common_name", NID_commonName},
     {"email", NID_pkcs9_emailAddress},
 };
+
+// The content of the file at `path`, up to its end or the first read error
+// (which ends the decoding as it would end reading from the file). False
+// only when the file cannot be opened.
+bool ReadWholeFile(const std::string& path, std::string* content) {
+  FilePtr file(std::fopen(path.c_str(), "r"));
+  if (!file) return false;
+  char chunk[4096];
+  size_t got;
+  while ((got = std::fread(chunk, 1, sizeof(chunk), file.get())) > 0) {
+    content->append(chunk, got);
+  }
+  return true;
+}
 
 // The role of a store file, or null for any other path.
 const char* FileType(const std::string& path) {
@@ -62,29 +76,21 @@ int getCertificateInfo(const std::string& path, Json::Value& entries,
   Json::Value additional =
       request != nullptr ? request->GetParam("additional", Json::Value())
                          : Json::Value();
-  FilePtr file(std::fopen(path.c_str(), "r"));
-  if (!file) return 4;
+  std::string pem;
+  if (!ReadWholeFile(path, &pem)) return 4;
+  std::shared_ptr<const CertificateFactsList> facts = CertificateFactsOf(path, pem);
   const char* type = FileType(path);
-  for (;;) {
-    X509Ptr certificate(
-        PEM_read_X509(file.get(), nullptr, RefusePemPassword, nullptr));
-    if (!certificate) break;
+  for (const CertificateFacts& certificate : *facts) {
     Json::Value entry(Json::objectValue);
-    entry["issuer"] = Json::Value();
-    entry["subject"] = Json::Value();
-    X509_NAME2Json(X509_get_issuer_name(certificate.get()), entry["issuer"]);
-    X509_NAME2Json(X509_get_subject_name(certificate.get()), entry["subject"]);
-    int algorithm = X509_get_signature_nid(certificate.get());
-    const char* algorithm_name = OBJ_nid2ln(algorithm);
-    entry["signature_algorithm"] = algorithm_name != nullptr ? algorithm_name : "";
+    entry["issuer"] = certificate.issuer;
+    entry["subject"] = certificate.subject;
+    entry["signature_algorithm"] = certificate.signature_algorithm;
     if (additional.isArray()) {
       for (const Json::Value& element : additional) {
         if (element == Json::Value("valid_from")) {
-          ASN1_TIME2Json(X509_get0_notBefore(certificate.get()),
-                         entry["valid_from"]);
+          entry["valid_from"] = certificate.valid_from;
         } else if (element == Json::Value("valid_till")) {
-          ASN1_TIME2Json(X509_get0_notAfter(certificate.get()),
-                         entry["valid_till"]);
+          entry["valid_till"] = certificate.valid_till;
         }
       }
     }

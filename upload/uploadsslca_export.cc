@@ -1,6 +1,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <string>
 #include <vector>
 
@@ -47,15 +48,27 @@ bool FindExportSet(const std::string& choice, ExportSet* set) {
   return true;
 }
 
+// Removes the previous archive when it is a plain file or absent, which is
+// what "rm -rf" would do, without starting a shell and rm for it. False when
+// something else is in the way (a folder, a file that does not unlink); the
+// command is then left to remove it or to fail as it would.
+bool RemovedPlainArchive(const char* archive) {
+  struct stat info;
+  if (lstat(archive, &info) != 0) return errno == ENOENT;
+  return !S_ISDIR(info.st_mode) && unlink(archive) == 0;
+}
+
 }  // namespace
 
 int SSLCAFormHandler::CreateArchive(const char** files, const char* archive,
                                     int count) {
-  ShellCommand remove(RootedCommandSize(kExportCommandSize));
-  remove.Append("/bin/rm -rf %s", {archive});
-  if (RunShellCommand(remove) != 0) {
-    ORVA_LOG_LASTERR("Remove previous archive failed");
-    return -1;
+  if (!RemovedPlainArchive(archive)) {
+    ShellCommand remove(RootedCommandSize(kExportCommandSize));
+    remove.Append("/bin/rm -rf %s", {archive});
+    if (RunShellCommand(remove) != 0) {
+      ORVA_LOG_LASTERR("Remove previous archive failed");
+      return -1;
+    }
   }
 
   ShellCommand pack(RootedCommandSize(kExportCommandSize));

@@ -1,6 +1,7 @@
 #include <unistd.h>
 
 #include <cstdio>
+#include <fstream>
 #include <string>
 
 #include <gtest/gtest.h>
@@ -94,6 +95,31 @@ TEST(CertificateList, TypeSelectsFilesAndIntermediateIsOptionalOnlyForAll) {
   EXPECT_EQ("inter_cert", all[2]["type"].asString());
   EXPECT_EQ("Test Root", all[2]["subject"]["common_name"].asString());
   EXPECT_EQ("nas.local", all[3]["subject"]["common_name"].asString());
+}
+
+// Decoded certificates are reused only while their file holds the same
+// bytes: a file rewritten in place (same inode, same path, nearly the same
+// time) is listed with its new content at once, and again with its old one.
+TEST(CertificateList, ShowsACertificateFileRewrittenInPlaceAtOnce) {
+  TempDeviceRoot root;
+  InstallCaAndServer(root);
+  ASSERT_TRUE(MakeSignedCertificate(root.Path(kCaKey), root.Path(kCaCrt),
+                                    root.Path("/other.key"), root.Path("/other.crt"),
+                                    "/C=TW/CN=nas.other"));
+  const std::string first = ReadFile(root.Path(kServerCrt));
+  const std::string second = ReadFile(root.Path("/other.crt"));
+  const struct {
+    const std::string* content;
+    const char* common_name;
+  } steps[] = {{&first, "nas.local"}, {&second, "nas.other"}, {&first, "nas.local"}};
+  for (const auto& step : steps) {
+    SCOPED_TRACE(step.common_name);
+    std::ofstream(root.Path(kServerCrt), std::ios::binary | std::ios::trunc) << *step.content;
+    ORVA::APIResponse response = List();
+    ASSERT_EQ(ORVA::APIResponse::Outcome::kSuccess, response.outcome());
+    EXPECT_EQ(step.common_name,
+              response.data()["certificates"][0]["subject"]["common_name"].asString());
+  }
 }
 
 TEST(CertificateList, MissingCaAnswers5504AndUnopenableServer5501) {

@@ -1,5 +1,6 @@
 #include <unistd.h>
 
+#include <cstdlib>
 #include <string>
 
 #include <gtest/gtest.h>
@@ -32,6 +33,24 @@ TEST(GenDir, MakesParentsAndRefusesEmptyPaths) {
   EXPECT_EQ(-1, genDir(""));
   EXPECT_EQ(-1, genDir(nullptr));
   EXPECT_TRUE(log.Contains(" genDir sanity check failed\n")) << log.Text();
+}
+
+// A failing "mkdir" first on PATH shows whether the directory command ran:
+// not for a folder that exists, and still for one that must be made.
+TEST(GenDir, RunsTheDirectoryCommandOnlyWhenThereIsSomethingToMake) {
+  TempDeviceRoot root;
+  root.WriteScript("/fake-bin/mkdir", "exit 1");
+  MakeDirs(root.Path("/present"));
+  const char* old_path = getenv("PATH");
+  const std::string saved = old_path != nullptr ? old_path : "/usr/bin:/bin";
+  setenv("PATH", (root.Path("/fake-bin") + ":" + saved).c_str(), 1);
+  int existing = genDir(root.Path("/present/file").c_str());
+  int missing = genDir(root.Path("/absent/file").c_str());
+  setenv("PATH", saved.c_str(), 1);
+
+  EXPECT_EQ(0, existing);
+  EXPECT_EQ(-1, missing);
+  EXPECT_FALSE(FileExists(root.Path("/absent")));
 }
 
 TEST(GenKey, RefusesSizesOfZeroAndAboveTheLimitBeforeAnythingRuns) {

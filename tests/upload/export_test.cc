@@ -80,6 +80,19 @@ TEST(CertificateExport, ArchivePacksTheInstalledFilesThereAreAndRemovesNothing) 
   }
 }
 
+// A folder where the archive belongs is not a plain file: it is removed with
+// everything in it, as the removal command does, and the archive takes its
+// place.
+TEST(CertificateExport, ArchiveReplacesAFolderInItsPlace) {
+  TempDeviceRoot root;
+  root.WriteFile("/usr/orva/etc/ssl/ssl.crt/server.crt", "certificate", 0400);
+  root.WriteFile(std::string(kArchive) + "/inside/file", "in the way");
+  Export result = ExportSet("archive");
+  ExpectDownload(result);
+  EXPECT_EQ("server.crt\n", ZipMembers(root, result.download.body));
+  EXPECT_EQ(result.download.body, ReadFile(root.Path(kArchive)));
+}
+
 TEST(CertificateExport, GeneratedSetsAreHandedOutOnce) {
   const struct {
     const char* choice;

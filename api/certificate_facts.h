@@ -1,0 +1,34 @@
+#ifndef ORVA_API_CERTIFICATE_FACTS_H_
+#define ORVA_API_CERTIFICATE_FACTS_H_
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <json/json.h>
+
+// What a certificate entry shows of one certificate, decoded once.
+struct CertificateFacts {
+  Json::Value issuer;   // null, or the name object (X509_NAME2Json)
+  Json::Value subject;  // likewise
+  std::string signature_algorithm;  // long name; "" when it has none
+  Json::Value valid_from;  // the printed time, or null when none was printed
+  Json::Value valid_till;
+};
+
+using CertificateFactsList = std::vector<CertificateFacts>;
+
+// The facts of every PEM certificate in `pem`, in order; decoding stops
+// quietly at the first block that does not decode.
+CertificateFactsList DecodeCertificateFacts(const std::string& pem);
+
+// The facts of the file at `path` whose whole content is `pem`. Decoding a
+// certificate costs the library far more than reading its file, and the
+// store's few files rarely change, so the facts of each path are kept with
+// the exact content they came from and reused while the content is the
+// same, byte for byte; any change is decoded anew. Safe to call from
+// several threads. The result is shared and never changes.
+std::shared_ptr<const CertificateFactsList> CertificateFactsOf(
+    const std::string& path, const std::string& pem);
+
+#endif  // ORVA_API_CERTIFICATE_FACTS_H_
