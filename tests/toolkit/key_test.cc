@@ -4,6 +4,7 @@
 
 #include <gtest/gtest.h>
 
+#include "tests/support/certificates.h"
 #include "tests/support/test_support.h"
 #include "tests/toolkit/toolkit_test_util.h"
 #include "toolkit/mkcert.h"
@@ -11,12 +12,21 @@
 namespace {
 const std::string kKey = "/usr/orva/etc/ssl/ssl.key/server.key";
 // Script lines that write the file named after "-out" as the tool would,
-// failing when it cannot be written.
-const std::string kWriteOutputFile =
-    "for arg; do\n"
-    "  if [ \"$previous\" = -out ]; then echo key > \"$arg\" || exit 1; fi\n"
-    "  previous=$arg\n"
-    "done\n";
+// failing when it cannot be written: a copy of the key `fixture` (a real
+// path), since only a whole key is installed.
+std::string WriteOutputFile(const std::string& fixture) {
+  return "for arg; do\n"
+         "  if [ \"$previous\" = -out ]; then cat '" + fixture + "' > \"$arg\" || exit 1; fi\n"
+         "  previous=$arg\n"
+         "done\n";
+}
+
+// A key for stand-in tools to hand out, at the real path returned.
+std::string FixtureKey(const TempDeviceRoot& root) {
+  std::string path = root.Path("/fixture.key");
+  EXPECT_TRUE(RunForTest("openssl genrsa -out '" + path + "' 1024"));
+  return path;
+}
 }  // namespace
 
 TEST(GenDir, MakesParentsAndRefusesEmptyPaths) {
@@ -54,7 +64,7 @@ TEST(GenKey, RefusesSizesOfZeroAndAboveTheLimitBeforeAnythingRuns) {
 TEST(GenKey, ToolFailureLeavesTheOldKeyAndNoTemporaryFile) {
   TempDeviceRoot root;
   root.WriteFile(kKey, "old key\n", 0400);
-  root.WriteScript("/usr/orva/bin/openssl", kWriteOutputFile + "exit 1");
+  root.WriteScript("/usr/orva/bin/openssl", WriteOutputFile(FixtureKey(root)) + "exit 1");
   LogCapture log;
   EXPECT_EQ(-1, genKey(root.Path(kKey).c_str(), 2048));
   EXPECT_TRUE(log.Contains(" Error when execute \"'" +
@@ -68,7 +78,7 @@ TEST(GenKey, HandsOnlyExistingSeedFilesToTheTool) {
   TempDeviceRoot root;
   root.WriteScript("/usr/orva/bin/openssl",
                    "echo \"$@\" > '" + root.Path("/args") + "'\n" +
-                   kWriteOutputFile + "exit 0");
+                   WriteOutputFile(FixtureKey(root)) + "exit 0");
   ASSERT_EQ(0, genKey(root.Path(kKey).c_str(), 2048));
 
   std::string existing;
@@ -103,10 +113,33 @@ TEST(GenKey, UserWithoutRootRightsMakesTheSameKeyTwice) {
   TempDeviceRoot root;
   // The machine's openssl may be reserved to root; what is proved here is
   // that a read-only key is replaced, which a stand-in shows as well.
-  root.WriteScript("/usr/orva/bin/openssl", kWriteOutputFile + "exit 0");
+  root.WriteScript("/usr/orva/bin/openssl", WriteOutputFile(FixtureKey(root)) + "exit 0");
   std::string key = root.Path(kKey);
   EXPECT_TRUE(RunAsUnprivilegedUser(root, [&key] {
     return genKey(key.c_str(), 1024) == 0 && genKey(key.c_str(), 1024) == 0;
   }));
   EXPECT_EQ(0400, FileMode(key));
+}
+
+TEST(GenKey, ToolSuccessWithoutAWholeKeyLeavesTheOldKey) {
+  // On a full disk the tool ends with 0 and leaves an empty or cut file.
+  for (const char* output : {": > \"$arg\"", "head -c 300 '@' > \"$arg\""}) {
+    SCOPED_TRACE(output);
+    TempDeviceRoot root;
+    std::string write = output;
+    std::string::size_type at = write.find('@');
+    if (at != std::string::npos) write.replace(at, 1, FixtureKey(root));
+    root.WriteFile(kKey, "old key\n", 0400);
+    root.WriteScript("/usr/orva/bin/openssl",
+                     "for arg; do\n"
+                     "  if [ \"$previous\" = -out ]; then " + write + "; fi\n"
+                     "  previous=$arg\n"
+                     "done\n"
+                     "exit 0");
+    LogCapture log;
+    EXPECT_EQ(-1, genKey(root.Path(kKey).c_str(), 1024));
+    EXPECT_TRUE(log.Contains(" is incomplete\n")) << log.Text();
+    EXPECT_EQ("old key\n", ReadFile(root.Path(kKey)));
+    EXPECT_EQ("", TemporaryFilesIn(root.Path("/usr/orva/etc/ssl/ssl.key")));
+  }
 }
