@@ -170,7 +170,7 @@ bool EnterPrivateMounts(std::string* why) {
       reason = "the tests do not run as root";
     } else if (unshare(CLONE_NEWNS) != 0) {
       reason = std::string("unshare(CLONE_NEWNS): ") + std::strerror(errno);
-    } else if (mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0) {
+    } else if (mount("none", "/", "none", MS_REC | MS_PRIVATE, nullptr) != 0) {
       reason = std::string("making mounts private: ") + std::strerror(errno);
     }
     result = reason.empty() ? 1 : 0;
@@ -324,11 +324,13 @@ bool TestMounts::Tmpfs(const std::string& path, size_t bytes) {
   return true;
 }
 
+// The kernel ignores the source and type of bind mounts and of changes to
+// mounts; "none" is given where it takes no null.
 bool TestMounts::ReadOnly(const std::string& path) {
   if (!EnterPrivateMounts(nullptr)) return false;
-  if (mount(path.c_str(), path.c_str(), nullptr, MS_BIND, nullptr) != 0) return false;
+  if (mount(path.c_str(), path.c_str(), "none", MS_BIND, nullptr) != 0) return false;
   mounted_.push_back(path);
-  return mount(nullptr, path.c_str(), nullptr, MS_REMOUNT | MS_BIND | MS_RDONLY, nullptr) == 0;
+  return mount("none", path.c_str(), "none", MS_REMOUNT | MS_BIND | MS_RDONLY, nullptr) == 0;
 }
 
 ORVA::APIResponse CallCreateCsr() {
