@@ -132,7 +132,7 @@ int verifyCrtAndKey(const char* certPath, const char* keyPath, CYPHER keyType);
 // work names and installed together once proved. 0 on success, otherwise
 // the result of the first failed step (-1; -2 for a refused subject; 1 for
 // a pair that does not match), logged; the earlier CA then stays as it
-// was (only the configuration file is rewritten).
+// was (only its configuration and extension files are rewritten).
 int genCASet(CSR_ARGUMENT* subject, int bits);
 
 // Appends every certificate of the PEM file at `path` to `certificates`,

@@ -11,6 +11,7 @@
 
 #include <cerrno>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 
 #include <gtest/gtest.h>
@@ -72,10 +73,11 @@ bool EndsWith(const std::string& text, const std::string& end) {
          text.compare(text.size() - end.size(), end.size(), end) == 0;
 }
 
-// Names the toolkit and the handlers give to files in progress.
+// Names of files in progress: the toolkit's "NAME.tmpXXXXXX", and any
+// hidden file (".new-NAME" and the like) but the serial file.
 bool IsWorkFile(const std::string& name) {
-  return name.find(".tmp") != std::string::npos || name.rfind(".new-", 0) == 0 ||
-         name.rfind(".crt-", 0) == 0;
+  return name.find(".tmp") != std::string::npos ||
+         (name[0] == '.' && name != ".mkcert.serial");
 }
 
 BioPtr MemoryBio(const std::string& content) {

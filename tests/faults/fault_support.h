@@ -37,12 +37,12 @@ void RestoreStore(const TempDeviceRoot& root, const StoreState& state);
 // when a fixture cannot be made.
 void InstallOldStore(const TempDeviceRoot& root);
 
-// After a fault: no temporary or work file is left, every file of `before`
-// is still there, and every store file is either as in `before` or a
-// complete file of its kind (keys, certificates and requests decode whole,
-// the serial is hex digits, configuration files end with a line end). The
-// live server pair, the CA pair and the pending pair each match where both
-// files exist. Reports failures with EXPECT.
+// After a fault: no temporary or work file (".tmp" in the name, or a
+// hidden file other than the serial file) is left, and every store file is
+// either as in `before` or a complete file of its kind (keys, certificates
+// and requests decode whole, the serial is hex digits, configuration files
+// end with a line end). The live server pair, the CA pair and the pending
+// pair each match where both files exist. Reports failures with EXPECT.
 void ExpectStoreWhole(const TempDeviceRoot& root, const StoreState& before);
 
 // The files that hold keys, certificates and requests, with their content
