@@ -17,6 +17,7 @@
 #include "platform/olib/orva_root.h"
 #include "platform/webapi/api_polling.h"
 #include "toolkit/mkcert.h"
+#include "toolkit/store_file.h"
 
 namespace {
 
@@ -68,8 +69,11 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
     ORVA_LOG("Generate CA key & crt failed");
     return made == -2 ? kErrBadParameter : kErrFailed;
   }
-  const std::string server_key = OrvaPath(kServerKeyPath);
-  const std::string server_crt = OrvaPath(kServerCrtPath);
+  // The live pair is made under work names and installed only once proved:
+  // a failure on the way leaves the running key and certificate together.
+  StoreFileSet server_pair;
+  const std::string server_key = server_pair.Add(OrvaPath(kServerKeyPath));
+  const std::string server_crt = server_pair.Add(OrvaPath(kServerCrtPath));
   if (genKey(server_key.c_str(), static_cast<unsigned int>(key_length)) == -1) {
     ORVA_LOG("Generate server key failed");
     return kErrFailed;
@@ -88,6 +92,10 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
   }
   if (verifyCrtAndKey(server_crt.c_str(), server_key.c_str(), CYPHER_RSA) != 0) {
     ORVA_LOG("Server crt and key is not matching.");
+    return kErrFailed;
+  }
+  if (server_pair.Install() != 0) {
+    ORVA_LOG("Install server crt and key failed");
     return kErrFailed;
   }
   const std::string intermediate = OrvaPath(kInterCrtPath);

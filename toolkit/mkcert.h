@@ -19,9 +19,10 @@
 // under the device root with OrvaPath) and reaches the tool quoted, whatever
 // it holds. Keys, requests and certificates are written by the tool under a
 // temporary name beside the target, given mode 0400 and renamed over the
-// target only when complete: on failure the earlier file stays as it was
-// and no temporary file is left. Configuration and extension files are
-// rewritten in place; directories made on the way stay.
+// target only when they decode whole (the tool reports success for output
+// it could not write on a full disk): on failure the earlier file stays as
+// it was and no temporary file is left. Configuration, extension and serial
+// files are replaced whole the same way; directories made on the way stay.
 
 // Key algorithm named by the first line of a private-key file.
 typedef enum __tag_CYPHER {
@@ -127,9 +128,11 @@ int verifyCrtAndKey(const char* certPath, const char* keyPath, CYPHER keyType);
 
 // Makes the local CA in the store: key (`bits`), request from `subject`
 // with the configuration "/usr/orva/etc/ssl/cfg.d/ca.cfg", self-signed
-// certificate for 3650 days, and proves the pair. 0 on success, otherwise
+// certificate for 3650 days, and proves the pair. The three are made under
+// work names and installed together once proved. 0 on success, otherwise
 // the result of the first failed step (-1; -2 for a refused subject; 1 for
-// a pair that does not match), logged. Earlier steps are not undone.
+// a pair that does not match), logged; the earlier CA then stays as it
+// was (only its configuration and extension files are rewritten).
 int genCASet(CSR_ARGUMENT* subject, int bits);
 
 // Appends every certificate of the PEM file at `path` to `certificates`,

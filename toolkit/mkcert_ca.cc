@@ -5,15 +5,19 @@
 #include "common/log.h"
 #include "toolkit/mkcert.h"
 #include "toolkit/mkcert_internal.h"
+#include "toolkit/store_file.h"
 
 namespace {
 constexpr int kCaValidityDays = 3650;
 }  // namespace
 
 int genCASet(CSR_ARGUMENT* subject, int bits) {
-  const std::string key = OrvaPath(kCaKeyPath);
-  const std::string request = OrvaPath(kCaCsrPath);
-  const std::string certificate = OrvaPath(kCaCrtPath);
+  // Made under work names and installed only as a proven set: a CA key
+  // beside the certificate of another key could sign nothing.
+  StoreFileSet set;
+  const std::string request = set.Add(OrvaPath(kCaCsrPath));
+  const std::string certificate = set.Add(OrvaPath(kCaCrtPath));
+  const std::string key = set.Add(OrvaPath(kCaKeyPath));
 
   int result = genKey(key.c_str(), static_cast<unsigned int>(bits));
   if (result != 0) {
@@ -36,6 +40,10 @@ int genCASet(CSR_ARGUMENT* subject, int bits) {
   if (result != 0) {
     ORVA_LOG("Root certificate and key is not matching");
     return result;
+  }
+  if (set.Install() != 0) {
+    ORVA_LOG("Install CA set failed");
+    return -1;
   }
   return 0;
 }

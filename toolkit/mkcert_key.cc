@@ -66,7 +66,7 @@ int genKey(const char* keyPath, unsigned int bits) {
     ORVA_LOG("generate directory failed");
     return -1;
   }
-  PendingStoreFile key(keyPath);
+  PendingStoreFile key(keyPath, StoreContent::kPrivateKey);
   if (!key.ok()) return -1;
 
   std::string seeds = ExistingSeedFiles();

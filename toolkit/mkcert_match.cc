@@ -15,34 +15,24 @@ namespace {
 constexpr size_t kDigestLineSize = 512;
 
 // The modulus stage keeps a line only when the tool printed a hexadecimal
-// modulus. For a file without one the digest stage gets no input at all, and
-// its line, the digest of nothing, counts as no digest line: it would be the
-// same for any two unreadable files. All three stages start together, as
-// the tool's own pipeline does; waiting for the modulus before starting the
-// digest stage cost a subshell and a tool start per digest.
+// modulus, and the digest stage runs only on such a line: a file without a
+// modulus yields no digest line at all instead of the digest of nothing,
+// which would be the same for any two unreadable files.
 constexpr char kCertificateDigest[] =
     "%s x509 -noout -modulus -in %s"
     " | sed -n 's/^Modulus=\\([0-9A-F][0-9A-F]*\\)$/\\1/p'"
-    " | %s md5";
+    " | { read -r modulus && echo \"$modulus\" | %s md5; }";
 constexpr char kKeyDigest[] =
     "%s rsa -noout -modulus -in %s"
     " | sed -n 's/^Modulus=\\([0-9A-F][0-9A-F]*\\)$/\\1/p'"
-    " | %s md5";
-
-// The MD5 digest of empty input, as the digest stage prints it in hex.
-constexpr char kDigestOfNothing[] = "d41d8cd98f00b204e9800998ecf8427e";
+    " | { read -r modulus && echo \"$modulus\" | %s md5; }";
 
 // The first output line of the digest pipeline `format` for `path`, in
-// `line`. 1 when the digest of a modulus was read; 0 otherwise (logged).
+// `line`. 1 when read, 0 otherwise.
 int DigestLine(const char* format, const char* path, char* line) {
   ShellCommand command(RootedCommandSize(kToolkitCommandSize));
   command.Append(format, {OpensslTool(), path, OpensslTool()});
-  if (getMd5(line, kDigestLineSize, command) == 0) return 0;
-  if (std::strstr(line, kDigestOfNothing) != nullptr) {
-    ORVA_LOG("Get md5 failed");
-    return 0;
-  }
-  return 1;
+  return getMd5(line, kDigestLineSize, command);
 }
 
 }  // namespace

@@ -130,7 +130,7 @@ int genCsr(const char* configPath, const char* keyPath,
   }
   if (modifyCsrCfg(configPath, *subject) != 0) return -1;
 
-  PendingStoreFile request(requestPath);
+  PendingStoreFile request(requestPath, StoreContent::kRequest);
   if (!request.ok()) return -1;
   ShellCommand command(RootedCommandSize(kToolkitCommandSize));
   command.Append(

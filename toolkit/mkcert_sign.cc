@@ -79,7 +79,7 @@ int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,
     return -1;
   }
 
-  PendingStoreFile certificate(output);
+  PendingStoreFile certificate(output, StoreContent::kCertificate);
   if (!certificate.ok()) return -1;
   ShellCommand command(RootedCommandSize(kToolkitCommandSize));
   command.Append("%s x509 -extfile %s -days %d -in %s -req -sha256 -out %s",

@@ -19,9 +19,15 @@ bool ParseJsonArray(const std::string& text, Json::Value* array) {
   std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
   Json::Value parsed;
   std::string errors;
-  if (!reader->parse(text.data(), text.data() + text.size(), &parsed,
-                     &errors) ||
-      !parsed.isArray()) {
+  try {
+    if (!reader->parse(text.data(), text.data() + text.size(), &parsed,
+                       &errors) ||
+        !parsed.isArray()) {
+      return false;
+    }
+  } catch (const Json::Exception&) {
+    // The reader throws instead of failing when the text nests deeper than
+    // the stack limit; for the client that is just a malformed value.
     return false;
   }
   *array = parsed;

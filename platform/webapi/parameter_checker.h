@@ -21,7 +21,9 @@ class ParameterChecker {
   // True when every rule holds: each necessary parameter is present and
   // each present parameter that has a rule is of its kind. A malformed rule
   // set fails. Conversions are made in `request` as the check goes; a
-  // failing check may leave earlier parameters converted.
+  // failing check may leave earlier parameters converted. Never throws,
+  // whatever the values hold (an array text nested deeper than 64 levels
+  // fails its rule).
   static bool check(ORVA::APIRequest* request, const Json::Value& rules);
 };
 

@@ -1,34 +1,40 @@
 #include <unistd.h>
 
-#include <cstdlib>
 #include <string>
 
 #include <gtest/gtest.h>
 
+#include "tests/support/certificates.h"
+#include "tests/support/test_support.h"
 #include "tests/toolkit/toolkit_test_util.h"
 #include "toolkit/mkcert.h"
 
 namespace {
-
-const std::string kKeyDir = "/usr/orva/etc/ssl/ssl.key";
-const std::string kKey = kKeyDir + "/server.key";
-
-// A stand-in tool that writes "new\n" to the file named after "-out", as the
-// real one would, and exits with `status`.
-void StandInTool(const TempDeviceRoot& root, int status) {
-  root.WriteScript("/usr/orva/bin/openssl",
-                   "for arg; do\n"
-                   "  if [ \"$previous\" = -out ]; then echo new > \"$arg\" || exit 1; fi\n"
-                   "  previous=$arg\n"
-                   "done\nexit " + std::to_string(status));
+const std::string kKey = "/usr/orva/etc/ssl/ssl.key/server.key";
+// Script lines that write the file named after "-out" as the tool would,
+// failing when it cannot be written: a copy of the key `fixture` (a real
+// path), since only a whole key is installed.
+std::string WriteOutputFile(const std::string& fixture) {
+  return "for arg; do\n"
+         "  if [ \"$previous\" = -out ]; then cat '" + fixture + "' > \"$arg\" || exit 1; fi\n"
+         "  previous=$arg\n"
+         "done\n";
 }
 
+// A key for stand-in tools to hand out, at the real path returned.
+std::string FixtureKey(const TempDeviceRoot& root) {
+  std::string path = root.Path("/fixture.key");
+  EXPECT_TRUE(RunForTest("openssl genrsa -out '" + path + "' 1024"));
+  return path;
+}
 }  // namespace
 
 TEST(GenDir, MakesParentsAndRefusesEmptyPaths) {
   TempDeviceRoot root;
   EXPECT_EQ(0, genDir(root.Path("/a/b/c/file").c_str()));
   EXPECT_TRUE(FileExists(root.Path("/a/b/c")));
+  EXPECT_EQ(0, genDir("file-in-current-directory"));
+
   LogCapture log;
   EXPECT_EQ(-1, genDir(""));
   EXPECT_EQ(-1, genDir(nullptr));
@@ -53,6 +59,15 @@ TEST(GenDir, RunsTheDirectoryCommandOnlyWhenThereIsSomethingToMake) {
   EXPECT_FALSE(FileExists(root.Path("/absent")));
 }
 
+TEST(GenKey, MakesReadOnlyKeyReplacingTheOldOne) {
+  TempDeviceRoot root;
+  root.WriteFile(kKey, "old key\n", 0644);
+  ASSERT_EQ(0, genKey(root.Path(kKey).c_str(), 1024));
+  EXPECT_EQ(0400, FileMode(root.Path(kKey)));
+  EXPECT_NE(std::string::npos, ReadFile(root.Path(kKey)).find("PRIVATE KEY"));
+  EXPECT_EQ("", TemporaryFilesIn(root.Path("/usr/orva/etc/ssl/ssl.key")));
+}
+
 TEST(GenKey, RefusesSizesOfZeroAndAboveTheLimitBeforeAnythingRuns) {
   for (unsigned int bits : {0u, 16385u, 0xFFFFFFFFu}) {
     SCOPED_TRACE(bits);
@@ -60,41 +75,89 @@ TEST(GenKey, RefusesSizesOfZeroAndAboveTheLimitBeforeAnythingRuns) {
     LogCapture log;
     EXPECT_EQ(-1, genKey(root.Path(kKey).c_str(), bits));
     EXPECT_TRUE(log.Contains(" genKey sanity failed\n")) << log.Text();
-    EXPECT_FALSE(FileExists(root.Path(kKeyDir)));
+    EXPECT_FALSE(FileExists(root.Path("/usr/orva/etc/ssl/ssl.key")));
   }
 }
 
-// The logged command line shows the seed list the tool was given.
-TEST(GenKey, ToolGetsOnlyExistingSeedFilesAndItsFailureKeepsTheOldKey) {
+TEST(GenKey, ToolFailureLeavesTheOldKeyAndNoTemporaryFile) {
   TempDeviceRoot root;
   root.WriteFile(kKey, "old key\n", 0400);
-  StandInTool(root, 1);
-  std::string seeds;
-  for (const char* file : {"/var/log/messages", "/var/run/dmesg.boot", "/var/log/system.log",
-                           "/etc/hosts", "/etc/group", "/etc/resolv.conf", "/bin/ls"}) {
-    if (access(file, F_OK) == 0) seeds += (seeds.empty() ? "" : ":") + std::string(file);
-  }
-  if (!seeds.empty()) seeds = "-rand '" + seeds + "' ";
+  root.WriteScript("/usr/orva/bin/openssl", WriteOutputFile(FixtureKey(root)) + "exit 1");
   LogCapture log;
   EXPECT_EQ(-1, genKey(root.Path(kKey).c_str(), 2048));
-  EXPECT_TRUE(log.Contains(" Error when execute \"'" + root.Path("/usr/orva/bin/openssl") +
-                           "' genrsa " + seeds + "-out '"))
+  EXPECT_TRUE(log.Contains(" Error when execute \"'" +
+                           root.Path("/usr/orva/bin/openssl") + "' genrsa "))
       << log.Text();
   EXPECT_EQ("old key\n", ReadFile(root.Path(kKey)));
-  EXPECT_EQ("", TemporaryFilesIn(root.Path(kKeyDir)));
+  EXPECT_EQ("", TemporaryFilesIn(root.Path("/usr/orva/etc/ssl/ssl.key")));
+}
+
+TEST(GenKey, HandsOnlyExistingSeedFilesToTheTool) {
+  TempDeviceRoot root;
+  root.WriteScript("/usr/orva/bin/openssl",
+                   "echo \"$@\" > '" + root.Path("/args") + "'\n" +
+                   WriteOutputFile(FixtureKey(root)) + "exit 0");
+  ASSERT_EQ(0, genKey(root.Path(kKey).c_str(), 2048));
+
+  std::string existing;
+  for (const char* file :
+       {"/var/log/messages", "/var/run/dmesg.boot", "/var/log/system.log",
+        "/etc/hosts", "/etc/group", "/etc/resolv.conf", "/bin/ls"}) {
+    if (access(file, F_OK) != 0) continue;
+    existing += (existing.empty() ? "" : ":") + std::string(file);
+  }
+  std::string args = ReadFile(root.Path("/args"));
+  if (existing.empty()) {
+    EXPECT_EQ(std::string::npos, args.find("-rand")) << args;
+  } else {
+    EXPECT_EQ(0u, args.find("genrsa -rand " + existing + " -out ")) << args;
+  }
+}
+
+TEST(GenKey, CommandLineThatDoesNotFitIsRefused) {
+  TempDeviceRoot root;
+  std::string folder = root.Path("/" + std::string(250, 'a') + "/" +
+                                 std::string(250, 'b') + "/" +
+                                 std::string(250, 'c') + "/" +
+                                 std::string(250, 'd'));
+  LogCapture log;
+  EXPECT_EQ(-1, genKey((folder + "/k.key").c_str(), 1024));
+  EXPECT_TRUE(log.Contains("does not fit")) << log.Text();
+  EXPECT_FALSE(FileExists(folder + "/k.key"));
+  EXPECT_EQ("", TemporaryFilesIn(folder));
 }
 
 TEST(GenKey, UserWithoutRootRightsMakesTheSameKeyTwice) {
   TempDeviceRoot root;
-  root.WriteFile(kKey, "old key\n", 0644);
   // The machine's openssl may be reserved to root; what is proved here is
   // that a read-only key is replaced, which a stand-in shows as well.
-  StandInTool(root, 0);
+  root.WriteScript("/usr/orva/bin/openssl", WriteOutputFile(FixtureKey(root)) + "exit 0");
   std::string key = root.Path(kKey);
   EXPECT_TRUE(RunAsUnprivilegedUser(root, [&key] {
     return genKey(key.c_str(), 1024) == 0 && genKey(key.c_str(), 1024) == 0;
   }));
   EXPECT_EQ(0400, FileMode(key));
-  EXPECT_EQ("new\n", ReadFile(key));
-  EXPECT_EQ("", TemporaryFilesIn(root.Path(kKeyDir)));
+}
+
+TEST(GenKey, ToolSuccessWithoutAWholeKeyLeavesTheOldKey) {
+  // On a full disk the tool ends with 0 and leaves an empty or cut file.
+  for (const char* output : {": > \"$arg\"", "head -c 300 '@' > \"$arg\""}) {
+    SCOPED_TRACE(output);
+    TempDeviceRoot root;
+    std::string write = output;
+    std::string::size_type at = write.find('@');
+    if (at != std::string::npos) write.replace(at, 1, FixtureKey(root));
+    root.WriteFile(kKey, "old key\n", 0400);
+    root.WriteScript("/usr/orva/bin/openssl",
+                     "for arg; do\n"
+                     "  if [ \"$previous\" = -out ]; then " + write + "; fi\n"
+                     "  previous=$arg\n"
+                     "done\n"
+                     "exit 0");
+    LogCapture log;
+    EXPECT_EQ(-1, genKey(root.Path(kKey).c_str(), 1024));
+    EXPECT_TRUE(log.Contains(" is incomplete\n")) << log.Text();
+    EXPECT_EQ("old key\n", ReadFile(root.Path(kKey)));
+    EXPECT_EQ("", TemporaryFilesIn(root.Path("/usr/orva/etc/ssl/ssl.key")));
+  }
 }

@@ -80,3 +80,14 @@ TEST(ParameterChecker, TextRuleRefusesOtherKindsAndUnknownCodesFail) {
   malformed["field"]["file"] = "4";
   EXPECT_FALSE(ParameterChecker::check(&text, malformed));
 }
+
+TEST(ParameterChecker, DeeplyNestedArrayTextFailsItsRuleWithoutThrowing) {
+  for (int depth : {32, 100, 100000}) {
+    SCOPED_TRACE(depth);
+    ORVA::APIRequest request = RequestWith(
+        "additional", std::string(depth, '[') + std::string(depth, ']'));
+    bool passed = true;
+    EXPECT_NO_THROW(passed = ParameterChecker::check(&request, Rules("additional", 8, false)));
+    EXPECT_EQ(depth <= 64, passed);
+  }
+}

@@ -1,0 +1,32 @@
+// The 7z tool missing: an export sends nothing, answers nothing and hands
+// nothing out.
+
+#include <unistd.h>
+
+#include <gtest/gtest.h>
+
+#include "api/certificate.h"
+#include "platform/webapi/api_download.h"
+#include "tests/faults/fault_support.h"
+
+TEST(ArchiverFaults, Missing7zSendsNothingAndKeepsEveryStoreFile) {
+  TempDeviceRoot root;
+  ASSERT_NO_FATAL_FAILURE(InstallOldStore(root));
+  ASSERT_EQ(0, unlink(root.Path("/usr/orva/bin/7z").c_str()));
+  const StoreState before = ReadStore(root);
+  for (const char* set : {"archive", "csr_set", "signed_set"}) {
+    SCOPED_TRACE(set);
+    Json::Value params(Json::objectValue);
+    params["file"] = set;
+    ORVA::APIRequest request("ORVA.Core.Certificate", "export", 1, params);
+    ORVA::APIResponse response;
+    ORVA::DownloadCollector collector;
+    doCertificateExport_v1(&request, &response);
+    EXPECT_FALSE(collector.result().has_body);
+    EXPECT_TRUE(response.output_enabled());
+    EXPECT_EQ(ORVA::APIResponse::Outcome::kNone, response.outcome());
+    EXPECT_FALSE(FileExists(root.Path("/usr/orva/etc/ssl/.gen/archive.zip")));
+    EXPECT_EQ(CertificateFiles(before), CertificateFiles(ReadStore(root)))
+        << "a set that was not sent is not handed out";
+  }
+}
