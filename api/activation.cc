@@ -2,6 +2,7 @@
 
 #include <string>
 
+#include "common/api_errors.h"
 #include "common/log.h"
 #include "platform/olib/olib_service.h"
 
@@ -79,4 +80,21 @@ void activateCertificate(ActivationSequence sequence,
 void closePluginHandle(OLIBPLUGIN_HANDLE* handle) {
   OLIBPluginExit(*handle);
   *handle = nullptr;
+}
+
+void answerInstallRequest(ActivationSequence sequence, int code,
+                          ORVA::APIResponse* response, const char* sourceFile) {
+  Json::Value result(Json::objectValue);
+  result["restart_httpd"] = false;
+  OrvaConf conf;
+  OLIBPLUGIN_HANDLE plugin = nullptr;
+  if (code == kErrNone) {
+    activateCertificate(sequence, response, result, conf, &plugin, sourceFile);
+  }
+  closePluginHandle(&plugin);
+  if (code == kErrNone) {
+    response->SetSuccess(result);
+  } else {
+    response->SetError(code, Json::Value());
+  }
 }

@@ -45,4 +45,11 @@ void activateCertificate(ActivationSequence sequence,
 // takes null as well) and leaves *handle null.
 void closePluginHandle(OLIBPLUGIN_HANDLE* handle);
 
+// Ends a request that installs a server certificate. When `code` is 5502
+// (the certificate is in place) runs `sequence` and answers success with
+// the result object {"restart_httpd": bool}; otherwise answers `code` with
+// null data. The plug-in handle is released on both paths.
+void answerInstallRequest(ActivationSequence sequence, int code,
+                          ORVA::APIResponse* response, const char* sourceFile);
+
 #endif  // ORVA_API_ACTIVATION_H_

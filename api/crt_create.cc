@@ -12,8 +12,6 @@
 #include "common/log.h"
 #include "common/store_paths.h"
 #include "platform/olib/olib_file.h"
-#include "platform/olib/olib_plugin.h"
-#include "platform/olib/orva_conf.h"
 #include "platform/olib/orva_root.h"
 #include "platform/webapi/api_polling.h"
 #include "toolkit/mkcert.h"
@@ -109,21 +107,7 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
 }  // namespace
 
 void handleCRTAction(ORVA::APIRequest* request, ORVA::APIResponse* response) {
-  Json::Value result(Json::objectValue);
-  result["restart_httpd"] = false;
-  OrvaConf conf;
-  OLIBPLUGIN_HANDLE plugin = nullptr;
   ORVA::APIPolling polling;
-
   int code = CreateCertificateSet(request);
-  if (code == kErrNone) {
-    activateCertificate(kActivateAfterCreation, response, result, conf, &plugin,
-                        __FILE__);
-  }
-  closePluginHandle(&plugin);
-  if (code == kErrNone) {
-    response->SetSuccess(result);
-  } else {
-    response->SetError(code, Json::Value());
-  }
+  answerInstallRequest(kActivateAfterCreation, code, response, __FILE__);
 }

@@ -9,7 +9,6 @@
 #include "common/log.h"
 #include "common/store_paths.h"
 #include "platform/olib/olib_file.h"
-#include "platform/olib/orva_conf.h"
 #include "platform/olib/orva_root.h"
 #include "upload/staged_copy.h"
 #include "upload/uploadsslca.h"
@@ -79,13 +78,10 @@ void SSLCAFormHandler::ProcessJsonReq(ORVA::APIRequest* request,
   const std::string interPath =
       request->GetParam("inter_cert_tmp", "").asString();
 
-  Json::Value result(Json::objectValue);
-  result["restart_httpd"] = false;
-  OrvaConf conf;
-  OLIBPLUGIN_HANDLE plugin = nullptr;
+  Json::Value unused_reply;
 
   int code = checkCAContent(certPath.c_str(), keyPath.c_str(),
-                            interPath.c_str(), result);
+                            interPath.c_str(), unused_reply);
   if (code != kErrNone) {
     ORVA_LOG("ProcessJsonReq: checkCAContent failed");
   } else {
@@ -95,15 +91,5 @@ void SSLCAFormHandler::ProcessJsonReq(ORVA::APIRequest* request,
         certPath, keyPath,
         request->HasParam("inter_cert_tmp") ? &interPath : nullptr);
   }
-  if (code == kErrNone) {
-    activateCertificate(kActivateAfterImport, response, result, conf, &plugin,
-                        __FILE__);
-  }
-
-  closePluginHandle(&plugin);
-  if (code == kErrNone) {
-    response->SetSuccess(result);
-  } else {
-    response->SetError(code, Json::Value());
-  }
+  answerInstallRequest(kActivateAfterImport, code, response, __FILE__);
 }
