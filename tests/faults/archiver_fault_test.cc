@@ -6,7 +6,6 @@
 #include <gtest/gtest.h>
 
 #include "api/certificate.h"
-#include "platform/webapi/api_download.h"
 #include "tests/faults/fault_support.h"
 
 TEST(ArchiverFaults, Missing7zSendsNothingAndKeepsEveryStoreFile) {
@@ -16,13 +15,8 @@ TEST(ArchiverFaults, Missing7zSendsNothingAndKeepsEveryStoreFile) {
   const StoreState before = ReadStore(root);
   for (const char* set : {"archive", "csr_set", "signed_set"}) {
     SCOPED_TRACE(set);
-    Json::Value params(Json::objectValue);
-    params["file"] = set;
-    ORVA::APIRequest request("ORVA.Core.Certificate", "export", 1, params);
     ORVA::APIResponse response;
-    ORVA::DownloadCollector collector;
-    doCertificateExport_v1(&request, &response);
-    EXPECT_FALSE(collector.result().has_body);
+    EXPECT_FALSE(CallExport(set, &response));
     EXPECT_TRUE(response.output_enabled());
     EXPECT_EQ(ORVA::APIResponse::Outcome::kNone, response.outcome());
     EXPECT_FALSE(FileExists(root.Path("/usr/orva/etc/ssl/.gen/archive.zip")));

@@ -17,6 +17,7 @@
 #include <gtest/gtest.h>
 
 #include "api/certificate.h"
+#include "platform/webapi/api_download.h"
 #include "common/pem_password.h"
 #include "common/raii.h"
 #include "tests/support/certificates.h"
@@ -369,6 +370,15 @@ ORVA::APIResponse CallCreateCrt() {
 ORVA::APIResponse CallList() {
   return Call(doCertificateList_v1, "ORVA.Core.Certificate", "list",
               Json::Value(Json::objectValue));
+}
+
+bool CallExport(const char* set, ORVA::APIResponse* response) {
+  Json::Value params(Json::objectValue);
+  params["file"] = set;
+  ORVA::APIRequest request("ORVA.Core.Certificate", "export", 1, params);
+  ORVA::DownloadCollector collector;
+  doCertificateExport_v1(&request, response);
+  return collector.result().has_body;
 }
 
 std::vector<StoreWriter> StoreWriters() {

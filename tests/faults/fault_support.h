@@ -91,6 +91,9 @@ ORVA::APIResponse CallRenew();
 ORVA::APIResponse CallSign(const std::string& csrPath);
 ORVA::APIResponse CallCreateCrt();
 ORVA::APIResponse CallList();
+// Exports `set`; stores the answer in *response and returns whether a
+// download body was sent.
+bool CallExport(const char* set, ORVA::APIResponse* response);
 
 // A method that writes the store, by name, for tables of cases.
 struct StoreWriter {

@@ -7,7 +7,6 @@
 #include <gtest/gtest.h>
 
 #include "api/certificate.h"
-#include "platform/webapi/api_download.h"
 #include "tests/faults/fault_support.h"
 
 namespace {
@@ -72,13 +71,8 @@ TEST_F(FullDisk, ExportOnAFullDiskSendsNothingAndLeavesNoArchive) {
   ASSERT_NO_FATAL_FAILURE(FillDisk(root_));
   for (const char* set : {"archive", "csr_set"}) {
     SCOPED_TRACE(set);
-    Json::Value params(Json::objectValue);
-    params["file"] = set;
-    ORVA::APIRequest request("ORVA.Core.Certificate", "export", 1, params);
     ORVA::APIResponse response;
-    ORVA::DownloadCollector collector;
-    doCertificateExport_v1(&request, &response);
-    EXPECT_FALSE(collector.result().has_body);
+    EXPECT_FALSE(CallExport(set, &response));
     EXPECT_FALSE(FileExists(root_.Path(std::string(kStore) + "/.gen/archive.zip")))
         << "no cut archive is left";
     EXPECT_EQ(CertificateFiles(before_), CertificateFiles(ReadStore(root_)));
