@@ -75,10 +75,11 @@ bool EndsWith(const std::string& text, const std::string& end) {
 }
 
 // Names of files in progress: the toolkit's "NAME.tmpXXXXXX", and any
-// hidden file (".new-NAME" and the like) but the serial file.
+// hidden file (".new-NAME", ".server.key.XXXXXX" and the like) but the
+// serial file and a file a test put in place of the generation folder.
 bool IsWorkFile(const std::string& name) {
   return name.find(".tmp") != std::string::npos ||
-         (name[0] == '.' && name != ".mkcert.serial");
+         (name[0] == '.' && name != ".mkcert.serial" && name != ".gen");
 }
 
 BioPtr MemoryBio(const std::string& content) {
@@ -245,6 +246,10 @@ void InstallOldStore(const TempDeviceRoot& root) {
   }
   ASSERT_TRUE(MakeRequest(root.Path("/uploads/request.key"),
                           root.Path("/uploads/request.csr"), "/CN=client.local", 1024));
+  ASSERT_TRUE(MakeSignedCertificate(ssl + "/ssl.key/ca.key", ssl + "/ssl.crt/ca.crt",
+                                    root.Path("/uploads/server.key"),
+                                    root.Path("/uploads/server.crt"), "/CN=imported.local", 1024));
+  root.WriteFile("/uploads/server-ca.crt", ReadFile(ssl + "/ssl.crt/ca.crt"));
 }
 
 void ExpectStoreWhole(const TempDeviceRoot& root, const StoreState& before) {
@@ -295,16 +300,22 @@ int ToolRuns(const TempDeviceRoot& root) {
   return std::atoi(ReadFile(root.Path("/openssl.runs")).c_str());
 }
 
-void FillDisk(const TempDeviceRoot& root) {
-  FilePtr filler(std::fopen((StorePath(root) + "/" + kFiller).c_str(), "w"));
-  ASSERT_TRUE(filler != nullptr);
-  static const char kBlock[4096] = {0};
-  for (int i = 0; i < 4096; ++i) {
-    if (std::fwrite(kBlock, 1, sizeof(kBlock), filler.get()) != sizeof(kBlock) ||
-        std::fflush(filler.get()) != 0) {
-      return;
+void FillDisk(const TempDeviceRoot& root, off_t room) {
+  const std::string path = StorePath(root) + "/" + kFiller;
+  {
+    FilePtr filler(std::fopen(path.c_str(), "w"));
+    ASSERT_TRUE(filler != nullptr);
+    static const char kBlock[4096] = {0};
+    for (int i = 0; i < 4096; ++i) {
+      if (std::fwrite(kBlock, 1, sizeof(kBlock), filler.get()) != sizeof(kBlock) ||
+          std::fflush(filler.get()) != 0) {
+        break;
+      }
     }
   }
+  struct stat info;
+  ASSERT_TRUE(stat(path.c_str(), &info) == 0 && info.st_size >= room);
+  ASSERT_EQ(0, truncate(path.c_str(), info.st_size - room));
 }
 
 void FreeDisk(const TempDeviceRoot& root) {
@@ -372,6 +383,15 @@ ORVA::APIResponse CallList() {
               Json::Value(Json::objectValue));
 }
 
+ORVA::APIResponse CallImport(const std::string& certPath, const std::string& keyPath,
+                             const std::string& interPath) {
+  Json::Value params(Json::objectValue);
+  params["cert_tmp"] = certPath;
+  params["key_tmp"] = keyPath;
+  params["inter_cert_tmp"] = interPath;
+  return Call(doCertificateImport_v1, "ORVA.Core.Certificate", "import", params);
+}
+
 bool CallExport(const char* set, ORVA::APIResponse* response) {
   Json::Value params(Json::objectValue);
   params["file"] = set;
@@ -389,4 +409,19 @@ std::vector<StoreWriter> StoreWriters() {
        [](const TempDeviceRoot& root) { return CallSign(root.Path("/uploads/request.csr")); }},
       {"CRT create", [](const TempDeviceRoot&) { return CallCreateCrt(); }},
   };
+}
+
+StoreWriter ImportWriter() {
+  return {"import",
+          [](const TempDeviceRoot& root) {
+            return CallImport(root.Path("/uploads/server.crt"), root.Path("/uploads/server.key"),
+                              root.Path("/uploads/server-ca.crt"));
+          },
+          5515};
+}
+
+std::vector<StoreWriter> StoreWritersAndImport() {
+  std::vector<StoreWriter> writers = StoreWriters();
+  writers.push_back(ImportWriter());
+  return writers;
 }

@@ -59,8 +59,9 @@ void InstallFaultyOpenssl(const TempDeviceRoot& root, const ToolFault& fault);
 // Runs counted since the script was installed.
 int ToolRuns(const TempDeviceRoot& root);
 // Fills the store's disk up (at most 16 MiB, so a store that is not on a
-// small disk never fills the machine's); FreeDisk removes the filler.
-void FillDisk(const TempDeviceRoot& root);
+// small disk never fills the machine's), then gives `room` bytes back;
+// FreeDisk removes the filler.
+void FillDisk(const TempDeviceRoot& root, off_t room = 0);
 void FreeDisk(const TempDeviceRoot& root);
 
 // Mounts made for one test, undone by the destructor in reverse order. They
@@ -91,6 +92,9 @@ ORVA::APIResponse CallRenew();
 ORVA::APIResponse CallSign(const std::string& csrPath);
 ORVA::APIResponse CallCreateCrt();
 ORVA::APIResponse CallList();
+// Imports the uploads at the real paths given.
+ORVA::APIResponse CallImport(const std::string& certPath, const std::string& keyPath,
+                             const std::string& interPath);
 // Exports `set`; stores the answer in *response and returns whether a
 // download body was sent.
 bool CallExport(const char* set, ORVA::APIResponse* response);
@@ -99,9 +103,15 @@ bool CallExport(const char* set, ORVA::APIResponse* response);
 struct StoreWriter {
   const char* name;
   std::function<ORVA::APIResponse(const TempDeviceRoot&)> call;
+  int write_error = 5501;  // its answer when the store cannot be written
 };
 // CSR create, renew, sign (of a request kept outside the store) and CRT
-// create.
+// create: the writers that make their files with openssl.
 std::vector<StoreWriter> StoreWriters();
+// The import of the uploaded server set InstallOldStore made. It copies
+// files into the store and runs openssl only to compare the pair.
+StoreWriter ImportWriter();
+// StoreWriters() and ImportWriter().
+std::vector<StoreWriter> StoreWritersAndImport();
 
 #endif  // ORVA_TESTS_FAULTS_FAULT_SUPPORT_H_

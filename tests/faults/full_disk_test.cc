@@ -1,6 +1,9 @@
 // A full disk while keys, requests and certificates are written: the store
 // lies on a small tmpfs, which the openssl stand-in fills up right before
-// one of its runs. Needs root with mount rights; skipped otherwise.
+// one of its runs, or which is filled before the call with room for a given
+// number of copies. Needs root with mount rights; skipped otherwise.
+
+#include <unistd.h>
 
 #include <string>
 
@@ -34,7 +37,7 @@ class FullDisk : public testing::Test {
 };
 
 TEST_F(FullDisk, EveryWriterFillingTheDiskAtAnyToolRunLeavesWholeFiles) {
-  for (const StoreWriter& writer : StoreWriters()) {
+  for (const StoreWriter& writer : StoreWritersAndImport()) {
     InstallFaultyOpenssl(root_, ToolFault{});
     ASSERT_EQ(Outcome::kSuccess, writer.call(root_).outcome()) << writer.name;
     const int runs = ToolRuns(root_);
@@ -46,7 +49,7 @@ TEST_F(FullDisk, EveryWriterFillingTheDiskAtAnyToolRunLeavesWholeFiles) {
       ORVA::APIResponse response = writer.call(root_);
       // A run that writes nothing may find the disk full and still succeed.
       if (response.outcome() != Outcome::kSuccess) {
-        EXPECT_EQ(5501, response.error_code());
+        EXPECT_EQ(writer.write_error, response.error_code());
       }
       ExpectStoreWhole(root_, before_);
       FreeDisk(root_);
@@ -56,12 +59,40 @@ TEST_F(FullDisk, EveryWriterFillingTheDiskAtAnyToolRunLeavesWholeFiles) {
 }
 
 TEST_F(FullDisk, FullBeforeTheRequestFailsEveryWriterAndKeepsEveryCertificateFile) {
-  for (const StoreWriter& writer : StoreWriters()) {
+  for (const StoreWriter& writer : StoreWritersAndImport()) {
     SCOPED_TRACE(writer.name);
     InstallFaultyOpenssl(root_, ToolFault{0, 1});
-    EXPECT_EQ(5501, writer.call(root_).error_code());
+    EXPECT_EQ(writer.write_error, writer.call(root_).error_code());
     ExpectStoreWhole(root_, before_);
     EXPECT_EQ(CertificateFiles(before_), CertificateFiles(ReadStore(root_)));
+    FreeDisk(root_);
+    RestoreStore(root_, before_);
+  }
+}
+
+// The import copies its uploads with "/bin/cp" after the tool's checks. Each
+// upload takes one page of the tmpfs, so leaving room for `copied` pages
+// fills the disk during the next copy.
+TEST_F(FullDisk, ImportRunningOutOfRoomAtAnyCopyKeepsTheOldSetAndNoCopy) {
+  const char* uploads[] = {"server.crt", "server.key", "server-ca.crt"};
+  const long page = sysconf(_SC_PAGESIZE);
+  for (int copied = 0; copied <= 3; ++copied) {
+    SCOPED_TRACE("room for " + std::to_string(copied) + " copies");
+    ASSERT_NO_FATAL_FAILURE(FillDisk(root_, copied * page));
+    LogCapture log;
+    ORVA::APIResponse response = ImportWriter().call(root_);
+    if (copied == 3) {
+      EXPECT_EQ(Outcome::kSuccess, response.outcome()) << log.Text();
+      EXPECT_EQ(ReadFile(root_.Path("/uploads/server.crt")),
+                ReadFile(root_.Path(std::string(kStore) + "/ssl.crt/server.crt")));
+    } else {
+      EXPECT_EQ(5515, response.error_code());
+      EXPECT_TRUE(log.Contains("CA copy command failed:/bin/cp '" +
+                               root_.Path("/uploads/") + uploads[copied] + "'"))
+          << log.Text();
+      EXPECT_EQ(CertificateFiles(before_), CertificateFiles(ReadStore(root_)));
+    }
+    ExpectStoreWhole(root_, before_);
     FreeDisk(root_);
     RestoreStore(root_, before_);
   }

@@ -81,3 +81,41 @@ TEST(ToolFaults, EveryWriterFailingAtAnyToolRunLeavesWholeMatchingFiles) {
     }
   }
 }
+
+// The import runs the tool only to compare the key with the certificate;
+// when the tool fails or is missing the library decides, so a matching set
+// is installed whole and a foreign key is still refused.
+TEST(ToolFaults, ImportWithTheToolFailingAtAnyRunOrMissingInstallsOnlyAMatchingSet) {
+  TempDeviceRoot root;
+  ASSERT_NO_FATAL_FAILURE(InstallOldStore(root));
+  const StoreState before = ReadStore(root);
+  const int runs = CountToolRuns(root, ImportWriter(), before);
+  ASSERT_GT(runs, 0);
+  const std::string crt = root.Path("/uploads/server.crt");
+  const std::string inter = root.Path("/uploads/server-ca.crt");
+  for (const char* key : {"/uploads/server.key", "/uploads/request.key"}) {
+    const bool matching = std::string(key) == "/uploads/server.key";
+    for (int failing = 0; failing <= runs; ++failing) {
+      SCOPED_TRACE(std::string(key) + ", " +
+                   (failing == 0 ? "no tool" : "tool run " + std::to_string(failing) + " of " +
+                                                   std::to_string(runs) + " fails"));
+      if (failing == 0) {
+        ASSERT_EQ(0, unlink(root.Path("/usr/orva/bin/openssl").c_str()));
+      } else {
+        InstallFaultyOpenssl(root, ToolFault{failing, 0});
+      }
+      ORVA::APIResponse response = CallImport(crt, root.Path(key), inter);
+      const StoreState after = ReadStore(root);
+      ExpectStoreWhole(root, before);
+      if (matching) {
+        EXPECT_EQ(Outcome::kSuccess, response.outcome()) << response.error_code();
+        EXPECT_EQ(ReadFile(crt), after.at("ssl.crt/server.crt").content);
+        EXPECT_EQ(ReadFile(root.Path(key)), after.at("ssl.key/server.key").content);
+      } else {
+        EXPECT_EQ(5514, response.error_code());
+        EXPECT_EQ(CertificateFiles(before), CertificateFiles(after));
+      }
+      RestoreStore(root, before);
+    }
+  }
+}
