@@ -10,7 +10,9 @@
 //                     is its boundary, the rest the body
 //   options & 3 == 3  as 2, but the second line is the whole Content-Type
 // options >> 2, when not 0, is the most bytes one read gets, as when a
-// client's request arrives in small pieces; 0 gives all it asks for.
+// client's request arrives in small pieces; 0 gives all it asks for. (The
+// installed HTTP library refuses a multipart body whose reads are shorter
+// than its boundary line, so such inputs end before ParseWebapiRequest.)
 //
 // Beyond crashes it checks the call against the rules it must follow,
 // worked out independently from the fields and parts the server read: the
