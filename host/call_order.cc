@@ -1,29 +1,41 @@
 #include "host/call_order.h"
 
-CallOrder::CallOrder() {
-  pthread_rwlockattr_t attributes;
-  pthread_rwlockattr_init(&attributes);
-  // glibc's default lets new readers overtake a waiting writer.
-  pthread_rwlockattr_setkind_np(&attributes,
-                                PTHREAD_RWLOCK_PREFER_WRITER_NONRECURSIVE_NP);
-  pthread_rwlock_init(&lock_, &attributes);
-  pthread_rwlockattr_destroy(&attributes);
-}
-
-CallOrder::~CallOrder() { pthread_rwlock_destroy(&lock_); }
-
 bool CallOrder::IsSharedCall(const std::string& api, const std::string& method) {
   return api == "ORVA.Core.Certificate" && method == "list";
 }
 
-CallOrder::Turn::Turn(CallOrder* order, const std::string& api,
-                      const std::string& method)
-    : order_(order) {
-  if (IsSharedCall(api, method)) {
-    pthread_rwlock_rdlock(&order_->lock_);
+void CallOrder::Enter(bool shared) {
+  std::unique_lock<std::mutex> lock(mutex_);
+  const uint64_t number = next_number_++;
+  changed_.wait(lock, [&] {
+    return number == next_to_start_ && !writer_running_ && (shared || readers_running_ == 0);
+  });
+  ++next_to_start_;
+  if (shared) {
+    ++readers_running_;
   } else {
-    pthread_rwlock_wrlock(&order_->lock_);
+    writer_running_ = true;
   }
+  // The next call may be a reader that can run beside this one.
+  changed_.notify_all();
 }
 
-CallOrder::Turn::~Turn() { pthread_rwlock_unlock(&order_->lock_); }
+void CallOrder::Leave(bool shared) {
+  {
+    std::lock_guard<std::mutex> lock(mutex_);
+    if (shared) {
+      --readers_running_;
+    } else {
+      writer_running_ = false;
+    }
+  }
+  changed_.notify_all();
+}
+
+CallOrder::Turn::Turn(CallOrder* order, const std::string& api,
+                      const std::string& method)
+    : order_(order), shared_(IsSharedCall(api, method)) {
+  order_->Enter(shared_);
+}
+
+CallOrder::Turn::~Turn() { order_->Leave(shared_); }

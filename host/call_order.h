@@ -1,19 +1,20 @@
 #ifndef ORVA_HOST_CALL_ORDER_H_
 #define ORVA_HOST_CALL_ORDER_H_
 
-#include <pthread.h>
-
+#include <condition_variable>
+#include <cstdint>
+#include <mutex>
 #include <string>
 
 // The order of method calls in the server: calls that change the store run
 // one at a time, while reading calls ("list") run side by side with each
-// other but never beside a changing call. A waiting writer goes before
-// readers that come after it, so a stream of "list" calls cannot hold a
-// certificate change off for ever.
+// other but never beside a changing call. Calls start in the order they
+// came: a waiting writer goes before readers that come after it, and a
+// waiting reader before writers that come after it, so neither a stream of
+// "list" calls nor a stream of certificate changes can hold the other off.
 class CallOrder {
  public:
-  CallOrder();
-  ~CallOrder();
+  CallOrder() = default;
 
   CallOrder(const CallOrder&) = delete;
   CallOrder& operator=(const CallOrder&) = delete;
@@ -21,8 +22,8 @@ class CallOrder {
   // True for the calls that only read the store and may share the lock.
   static bool IsSharedCall(const std::string& api, const std::string& method);
 
-  // Holds the lock, shared or exclusive as `api` and `method` ask, for as
-  // long as it lives.
+  // Waits for its turn and holds the lock, shared or exclusive as `api` and
+  // `method` ask, for as long as it lives.
   class Turn {
    public:
     Turn(CallOrder* order, const std::string& api, const std::string& method);
@@ -33,10 +34,21 @@ class CallOrder {
 
    private:
     CallOrder* order_;
+    bool shared_;
   };
 
  private:
-  pthread_rwlock_t lock_;
+  void Enter(bool shared);
+  void Leave(bool shared);
+
+  std::mutex mutex_;
+  std::condition_variable changed_;
+  // Calls take numbers as they come; the call numbered `next_to_start_`
+  // starts once the calls running allow it.
+  uint64_t next_number_ = 0;
+  uint64_t next_to_start_ = 0;
+  int readers_running_ = 0;
+  bool writer_running_ = false;
 };
 
 #endif  // ORVA_HOST_CALL_ORDER_H_
