@@ -34,7 +34,9 @@ void CallOrder::Leave(bool shared) {
 
 CallOrder::Turn::Turn(CallOrder* order, const std::string& api,
                       const std::string& method)
-    : order_(order), shared_(IsSharedCall(api, method)) {
+    : Turn(order, IsSharedCall(api, method)) {}
+
+CallOrder::Turn::Turn(CallOrder* order, bool shared) : order_(order), shared_(shared) {
   order_->Enter(shared_);
 }
 

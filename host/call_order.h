@@ -23,10 +23,11 @@ class CallOrder {
   static bool IsSharedCall(const std::string& api, const std::string& method);
 
   // Waits for its turn and holds the lock, shared or exclusive as `api` and
-  // `method` ask, for as long as it lives.
+  // `method` ask (or as `shared` says), for as long as it lives.
   class Turn {
    public:
     Turn(CallOrder* order, const std::string& api, const std::string& method);
+    Turn(CallOrder* order, bool shared);
     ~Turn();
 
     Turn(const Turn&) = delete;

@@ -24,11 +24,12 @@ constexpr char kWebapiPath[] = "/webapi";
 
 WebapiService::WebapiService(std::vector<const ORVA::APIEntry*> tables,
                              AccessToken token, StaticFiles web,
-                             std::function<void()> restart)
+                             std::function<void()> restart, CallOrder* order)
     : tables_(std::move(tables)),
       token_(token),
       web_(std::move(web)),
-      restart_(std::move(restart)) {}
+      restart_(std::move(restart)),
+      order_(order) {}
 
 void WebapiService::Install(httplib::Server* server) {
   using httplib::Request;
@@ -109,7 +110,7 @@ void WebapiService::ServeWebapi(const httplib::Request& request,
 CallOutcome WebapiService::Dispatch(const WebapiCall& call) {
   for (const ORVA::APIEntry* table : tables_) {
     if (FindApiRow(table, call.api, call.method, call.version) == nullptr) continue;
-    CallOrder::Turn turn(&order_, call.api, call.method);
+    CallOrder::Turn turn(order_, call.api, call.method);
     return CallApi(table, call.api, call.method, call.version, call.params);
   }
   return HostFailure(404);

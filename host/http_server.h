@@ -31,16 +31,16 @@ class WebapiService {
   // `tables`: the loaded modules' API tables, searched in order; the
   // modules must outlive this object. `restart`, when set, is called after
   // the answer to a call whose handler asked for a web server restart has
-  // been sent.
+  // been sent. Calls take their turns in `order`, which must outlive this
+  // object.
   WebapiService(std::vector<const ORVA::APIEntry*> tables, AccessToken token,
-                StaticFiles web, std::function<void()> restart);
+                StaticFiles web, std::function<void()> restart, CallOrder* order);
 
   WebapiService(const WebapiService&) = delete;
   WebapiService& operator=(const WebapiService&) = delete;
 
   // Sets up the routes, limits, timeouts and failure answers on `server`,
-  // which must be stopped before this object goes away. Calls on all the
-  // servers set up by one service share one CallOrder.
+  // which must be stopped before this object goes away.
   void Install(httplib::Server* server);
 
  private:
@@ -53,7 +53,7 @@ class WebapiService {
   const AccessToken token_;
   const StaticFiles web_;
   const std::function<void()> restart_;
-  CallOrder order_;
+  CallOrder* const order_;
 };
 
 #endif  // ORVA_HOST_HTTP_SERVER_H_

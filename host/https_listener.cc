@@ -6,8 +6,9 @@
 #include "platform/olib/orva_conf.h"
 
 HttpsListener::HttpsListener(ListenAddress address,
-                             std::function<void(httplib::Server*)> install)
-    : address_(std::move(address)), install_(std::move(install)) {}
+                             std::function<void(httplib::Server*)> install,
+                             CallOrder* store_order)
+    : address_(std::move(address)), install_(std::move(install)), store_order_(store_order) {}
 
 HttpsListener::~HttpsListener() { Stop(); }
 
@@ -56,8 +57,11 @@ void HttpsListener::Apply() {
     return;
   }
   std::string problem;
-  std::shared_ptr<const ServerCredentials> credentials =
-      ServerCredentials::LoadFromStore(&problem);
+  std::shared_ptr<const ServerCredentials> credentials;
+  {
+    CallOrder::Turn reading(store_order_, true);
+    credentials = ServerCredentials::LoadFromStore(&problem);
+  }
   if (!credentials) {
     ORVA_LOG("HTTPS listener is down: %s", problem.c_str());
     TakeDown();

@@ -11,6 +11,7 @@
 #include <mutex>
 #include <thread>
 
+#include "host/call_order.h"
 #include "host/listen_address.h"
 #include "host/listener_thread.h"
 #include "host/server_credentials.h"
@@ -28,9 +29,11 @@ class HttpsListener {
   enum class State { kOff, kDown, kUp };
 
   // `install` sets up the routes of every server the listener makes; it is
-  // called on the thread that brings the listener up.
+  // called on the thread that brings the listener up. The store is read in
+  // a reading turn of `store_order` (which must outlive the listener), so a
+  // reload never sees a certificate change half done.
   HttpsListener(ListenAddress address,
-                std::function<void(httplib::Server*)> install);
+                std::function<void(httplib::Server*)> install, CallOrder* store_order);
   // Stop().
   ~HttpsListener();
 
@@ -69,6 +72,7 @@ class HttpsListener {
 
   const ListenAddress address_;
   const std::function<void(httplib::Server*)> install_;
+  CallOrder* const store_order_;
   // The port bound first, kept so that port 0 binds the same port again.
   std::atomic<int> bound_port_{0};
   std::atomic<State> state_{State::kOff};

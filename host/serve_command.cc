@@ -75,12 +75,13 @@ int RunServe(const ServeOptions& options) {
 
   // The service and the HTTPS listener know each other: the listener sets
   // up its servers through the service, and the service asks it to reload.
+  CallOrder store_order;
   std::unique_ptr<WebapiService> service;
-  HttpsListener https(options.https, [&service](httplib::Server* server) {
-    service->Install(server);
-  });
-  service = std::make_unique<WebapiService>(std::move(tables), token, web,
-                                            [&https] { https.RequestReload(); });
+  HttpsListener https(
+      options.https, [&service](httplib::Server* server) { service->Install(server); },
+      &store_order);
+  service = std::make_unique<WebapiService>(
+      std::move(tables), token, web, [&https] { https.RequestReload(); }, &store_order);
 
   httplib::Server http;
   service->Install(&http);

@@ -112,6 +112,46 @@ TEST_F(ServeHttpsTest, PresentsTheStoreCertificateAndReloadsItOnRestartCalls) {
   EXPECT_EQ(0, watch.failed) << "the HTTP listener never went down";
 }
 
+TEST_F(ServeHttpsTest, ReloadReadsTheStoreOnlyAfterTheChangesQueuedBeforeIt) {
+  InstallSelfSignedCertificate("first.test");
+  const int port = FreeLoopbackPort();
+  ServeProcess server(scratch_.root(), {"--listen-https", "127.0.0.1:" + std::to_string(port)});
+  ASSERT_TRUE(server.started()) << server.Log();
+  auto hold = [&](const std::string& name, const std::string& extra) {
+    return std::thread([&server, this, name, extra] {
+      server.AuthorizedClient().Get(("/webapi?api=ORVA.Test&method=hold&entered=" +
+                                     scratch_.Path("/" + name + ".in") + "&release=" +
+                                     scratch_.Path("/" + name + ".go") + extra)
+                                        .c_str());
+    });
+  };
+  auto wait_for = [&](const std::string& name) {
+    auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+    while (!FileExists(scratch_.Path(name)) && std::chrono::steady_clock::now() < deadline) {
+      std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    }
+    return FileExists(scratch_.Path(name));
+  };
+
+  std::thread asking = hold("asking", "&restart=yes");
+  ASSERT_TRUE(wait_for("/asking.in"));
+  std::thread changing = hold("changing", "");
+  std::this_thread::sleep_for(std::chrono::seconds(1));  // queued behind "asking"
+  scratch_.WriteFile(kServerCrt, "half written\n");
+  scratch_.WriteFile("/asking.go", "");
+  ASSERT_TRUE(wait_for("/changing.in"));
+  InstallSelfSignedCertificate("second.test");
+  scratch_.WriteFile("/changing.go", "");
+  asking.join();
+  changing.join();
+
+  EXPECT_EQ("second.test", ProbeTlsUntil(port, [](const PresentedCertificates& seen) {
+                             return seen.common_name == "second.test";
+                           }).common_name);
+  EXPECT_EQ(std::string::npos, server.Log().find("HTTPS listener is down"))
+      << "the reload never saw the store in the middle of a change";
+}
+
 TEST_F(ServeHttpsTest, StoreThatDoesNotLoadLeavesHttpsDownAndHttpUp) {
   const std::string work = scratch_.Path("/work");
   ASSERT_TRUE(MakeSelfSignedCa(work + "/other.key", work + "/other.crt", "/CN=other"));

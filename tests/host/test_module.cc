@@ -57,7 +57,7 @@ void Throw(ORVA::APIRequest*, ORVA::APIResponse*) {
 }
 
 // Makes the file "entered", then waits (at most 20 s) until the file
-// "release" exists.
+// "release" exists. With "restart" it then asks for a web server restart.
 void Hold(ORVA::APIRequest* request, ORVA::APIResponse* response) {
   std::ofstream(request->GetParam("entered", "").asString()) << "in\n";
   std::string release = request->GetParam("release", "").asString();
@@ -69,6 +69,7 @@ void Hold(ORVA::APIRequest* request, ORVA::APIResponse* response) {
     }
     std::this_thread::sleep_for(std::chrono::milliseconds(5));
   }
+  response->SetHttpdRestart(request->HasParam("restart"));
   response->SetSuccess(true);
 }
 
