@@ -161,7 +161,8 @@ TEST_F(ServeTest, UploadReachesTheHandlerAsAPrivateFileThatIsGoneAfterTheCall) {
   ASSERT_TRUE(result);
   ASSERT_EQ(200, result->status) << result->body;
   Json::Value data = ParseJson(result->body)["data"];
-  EXPECT_EQ(content, data["content"].asString());
+  EXPECT_EQ("2d2d2d2d2d424547494e2043455254494649434154452d2d2d2d2d0a0001feff0d0a",
+            data["content_hex"].asString()) << "the content byte for byte";
   EXPECT_EQ(0600, data["mode"].asInt());
   EXPECT_EQ("../../evil name.pem", data["name"].asString()) << "the client's name, as text";
   const std::string path = data["path"].asString();
