@@ -17,13 +17,6 @@ namespace {
 
 constexpr char kListQuery[] = "/webapi?api=ORVA.Core.Certificate&method=list&type=server_cert";
 
-Json::Value HostError(int code) {
-  Json::Value answer(Json::objectValue);
-  answer["success"] = false;
-  answer["error"]["code"] = code;
-  return answer;
-}
-
 class ServeTest : public testing::Test {
  protected:
   void SetUp() override {
