@@ -197,10 +197,10 @@ TEST_F(ServeHostileInputTest, NoValueReachesAShellAndEveryPathReachesTheToolsWho
   for (const std::vector<std::string>& run : runs) {
     for (size_t w = 1; w < run.size(); ++w) {
       const std::string& word = run[w];
-      bool whole = word[0] == '-' || word.find_first_not_of("0123456789") == std::string::npos ||
-                   word == "genrsa" || word == "req" || word == "x509" || word == "rsa" ||
-                   word == "md5" || word == "a" || word.rfind(root_ + "/", 0) == 0 ||
-                   (run[w - 1] == "-rand" && word[0] == '/');
+      bool number = !word.empty() && word.find_first_not_of("0123456789") == std::string::npos;
+      bool whole = number || word[0] == '-' || word == "genrsa" || word == "req" ||
+                   word == "x509" || word == "rsa" || word == "md5" || word == "a" ||
+                   word.rfind(root_ + "/", 0) == 0 || (run[w - 1] == "-rand" && word[0] == '/');
       EXPECT_TRUE(whole) << "word " << w << " of a " << run[0] << " run: " << word;
     }
   }
