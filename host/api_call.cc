@@ -7,6 +7,43 @@
 #include "platform/webapi/api_request.h"
 #include "platform/webapi/api_response.h"
 
+namespace {
+
+constexpr char kReplacementCharacter[] = "\xEF\xBF\xBD";  // U+FFFD
+
+// The length of the well-formed UTF-8 sequence that starts at text[at], or
+// 0 when none does (stray or cut-short bytes, overlong forms, surrogates,
+// code points past U+10FFFF).
+size_t Utf8SequenceLength(const std::string& text, size_t at) {
+  unsigned char lead = static_cast<unsigned char>(text[at]);
+  if (lead < 0x80) return 1;
+  size_t length;
+  unsigned char low = 0x80, high = 0xBF;  // the second byte's range
+  if (lead >= 0xC2 && lead <= 0xDF) {
+    length = 2;
+  } else if (lead >= 0xE0 && lead <= 0xEF) {
+    length = 3;
+    if (lead == 0xE0) low = 0xA0;
+    if (lead == 0xED) high = 0x9F;
+  } else if (lead >= 0xF0 && lead <= 0xF4) {
+    length = 4;
+    if (lead == 0xF0) low = 0x90;
+    if (lead == 0xF4) high = 0x8F;
+  } else {
+    return 0;
+  }
+  if (text.size() - at < length) return 0;
+  for (size_t i = 1; i < length; ++i) {
+    unsigned char next = static_cast<unsigned char>(text[at + i]);
+    if (next < low || next > high) return 0;
+    low = 0x80;
+    high = 0xBF;
+  }
+  return length;
+}
+
+}  // namespace
+
 bool IsHostOnlyParameter(const std::string& name) {
   static const std::string kSuffix = "_tmp";
   return name.size() >= kSuffix.size() &&
@@ -70,7 +107,23 @@ std::string ToOneLineJson(const Json::Value& value) {
   Json::StreamWriterBuilder builder;
   builder["indentation"] = "";
   builder["emitUTF8"] = true;
-  return Json::writeString(builder, value);
+  // The writer copies the bytes of strings as they stand, and certificate
+  // names are read byte for byte: what is not UTF-8 is replaced. Bytes from
+  // 0x80 up occur only inside strings, so the JSON stays whole.
+  std::string json = Json::writeString(builder, value);
+  std::string valid;
+  valid.reserve(json.size());
+  for (size_t at = 0; at < json.size();) {
+    size_t length = Utf8SequenceLength(json, at);
+    if (length == 0) {
+      valid += kReplacementCharacter;
+      ++at;
+    } else {
+      valid.append(json, at, length);
+      at += length;
+    }
+  }
+  return valid;
 }
 
 std::string OfferedFileName(const ORVA::DownloadResult& download) {

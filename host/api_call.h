@@ -43,7 +43,8 @@ CallOutcome CallApi(const ORVA::APIEntry* table, const std::string& api,
 // A host-level failure with `status` as HTTP status and code.
 CallOutcome HostFailure(int status);
 
-// `value` as JSON text on one line.
+// `value` as JSON text on one line, in UTF-8: every byte of a string that
+// is not part of a well-formed UTF-8 sequence becomes U+FFFD.
 std::string ToOneLineJson(const Json::Value& value);
 
 // The file name offered by a content-disposition header value, reduced to a

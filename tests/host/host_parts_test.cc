@@ -10,6 +10,7 @@
 #include <gtest/gtest.h>
 
 #include "host/access_token.h"
+#include "host/api_call.h"
 #include "host/call_order.h"
 #include "host/listen_address.h"
 #include "host/request_parsing.h"
@@ -89,6 +90,29 @@ TEST(RequestParsing, RefusesMalformedRequestsWith400) {
     TemporaryUploads uploads;
     WebapiCall call;
     EXPECT_EQ(400, ParseWebapiRequest(request, &uploads, &call));
+  }
+}
+
+TEST(OneLineJson, ReplacesEveryByteOutsideWellFormedUtf8) {
+  const std::string kReplacement = "\xEF\xBF\xBD";
+  struct Case {
+    const char* text;
+    std::string json;  // between the quotes
+  } cases[] = {
+      {"Z\xC3\xBCrich \xE2\x82\xAC \xF0\x9F\x98\x80", "Z\xC3\xBCrich \xE2\x82\xAC \xF0\x9F\x98\x80"},
+      {"caf\xE9!", "caf" + kReplacement + "!"},
+      {"a\xC3(b", "a" + kReplacement + "(b"},         // lead byte without its follower
+      {"\xC0\xAF", kReplacement + kReplacement},        // overlong "/"
+      {"\xED\xA0\x80", kReplacement + kReplacement + kReplacement},  // a surrogate
+      {"\xF4\x90\x80\x80", kReplacement + kReplacement + kReplacement + kReplacement},
+      {"end\xE2\x82", "end" + kReplacement + kReplacement},  // cut short
+      {"\x80\tq\"", kReplacement + "\\tq\\\""},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.text);
+    Json::Value object(Json::objectValue);
+    object["k"] = c.text;
+    EXPECT_EQ("{\"k\":\"" + c.json + "\"}", ToOneLineJson(object));
   }
 }
 

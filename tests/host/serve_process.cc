@@ -158,7 +158,7 @@ sockaddr_in Loopback(int port) {
 
 }  // namespace
 
-std::string RawExchange(int port, const std::string& request) {
+std::string RawExchange(int port, const std::string& request, int firstReplyMs) {
   SocketCloser socket_fd(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
   sockaddr_in address = Loopback(port);
   if (socket_fd.fd < 0 ||
@@ -172,7 +172,7 @@ std::string RawExchange(int port, const std::string& request) {
   std::string response;
   pollfd waiting{socket_fd.fd, POLLIN, 0};
   char buffer[4096];
-  while (poll(&waiting, 1, 1000) > 0) {
+  while (poll(&waiting, 1, response.empty() ? firstReplyMs : 1000) > 0) {
     ssize_t got = recv(socket_fd.fd, buffer, sizeof(buffer), 0);
     if (got <= 0) break;
     response.append(buffer, static_cast<size_t>(got));
@@ -183,6 +183,13 @@ std::string RawExchange(int port, const std::string& request) {
 int RawStatus(const std::string& response) {
   if (response.rfind("HTTP/1.1 ", 0) != 0) return 0;
   return std::atoi(response.c_str() + 9);
+}
+
+Json::Value HostError(int code) {
+  Json::Value answer(Json::objectValue);
+  answer["success"] = false;
+  answer["error"]["code"] = code;
+  return answer;
 }
 
 Json::Value ParseJson(const std::string& text) {

@@ -56,11 +56,14 @@ int CountFiles(const std::string& folder);
 
 // Sends `request` as it stands to 127.0.0.1:PORT over plain TCP and returns
 // everything the server sent until it closed the connection or went quiet
-// for a second.
-std::string RawExchange(int port, const std::string& request);
+// for a second (for `firstReplyMs` before its first byte).
+std::string RawExchange(int port, const std::string& request, int firstReplyMs = 1000);
 
 // The HTTP status of a raw response ("HTTP/1.1 404 ..."), or 0.
 int RawStatus(const std::string& response);
+
+// The host's answer to a request it refuses with HTTP status `code`.
+Json::Value HostError(int code);
 
 // `text` parsed as JSON (null when it is not JSON).
 Json::Value ParseJson(const std::string& text);

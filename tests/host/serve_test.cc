@@ -17,13 +17,6 @@ namespace {
 
 constexpr char kListQuery[] = "/webapi?api=ORVA.Core.Certificate&method=list&type=server_cert";
 
-Json::Value HostError(int code) {
-  Json::Value answer(Json::objectValue);
-  answer["success"] = false;
-  answer["error"]["code"] = code;
-  return answer;
-}
-
 class ServeTest : public testing::Test {
  protected:
   void SetUp() override {
@@ -72,7 +65,8 @@ TEST_F(ServeTest, RequestsWithoutTheTokenGet401AndRunNothing) {
   const std::string hold = "/webapi?api=ORVA.Test&method=hold&entered=" + entered +
                            "&release=" + scratch_.Path("/release");
   for (const std::string& authorization :
-       {std::string(), "Bearer " + server.Token() + "0"}) {
+       {std::string(), "Bearer " + server.Token() + "0", std::string("Bearer "),
+        "Bearer " + std::string(6000, 'a') + server.Token()}) {
     SCOPED_TRACE(authorization);
     httplib::Headers headers;
     if (!authorization.empty()) headers.emplace("Authorization", authorization);
@@ -117,12 +111,12 @@ TEST_F(ServeTest, BodiesOverFourMebibytesAreRefusedWith413) {
   const int port = server.http_port();
   const std::string head = "POST /webapi HTTP/1.1\r\nHost: x\r\nConnection: close\r\n"
                            "Authorization: Bearer " + server.Token() + "\r\n";
-  // A multipart form for "list" padded with an unchecked field to `size`.
+  // A multipart form for "list" padded with an unchecked upload to `size`.
   auto list_form = [&](size_t size) {
     const std::string fields =
         "--b\r\nContent-Disposition: form-data; name=\"api\"\r\n\r\nORVA.Core.Certificate\r\n"
         "--b\r\nContent-Disposition: form-data; name=\"method\"\r\n\r\nlist\r\n"
-        "--b\r\nContent-Disposition: form-data; name=\"pad\"\r\n\r\n";
+        "--b\r\nContent-Disposition: form-data; name=\"pad\"; filename=\"pad.pem\"\r\n\r\n";
     const std::string end = "\r\n--b--\r\n";
     std::string body = fields + std::string(size - fields.size() - end.size(), 'a') + end;
     return head + "Content-Type: multipart/form-data; boundary=b\r\nContent-Length: " +
@@ -133,6 +127,7 @@ TEST_F(ServeTest, BodiesOverFourMebibytesAreRefusedWith413) {
   std::string over = RawExchange(port, list_form(limit + 1));
   EXPECT_EQ(413, RawStatus(over));
   EXPECT_EQ(HostError(413), ParseJson(over.substr(over.find("\r\n\r\n") + 4)));
+  EXPECT_EQ(0, CountFiles(server.UploadFolder())) << "nothing saved";
   EXPECT_EQ(413, RawStatus(RawExchange(
                      port, head + "Content-Length: 1000000000\r\nExpect: 100-continue\r\n\r\n")))
       << "refused before the body is sent";
@@ -161,7 +156,8 @@ TEST_F(ServeTest, UploadReachesTheHandlerAsAPrivateFileThatIsGoneAfterTheCall) {
   ASSERT_TRUE(result);
   ASSERT_EQ(200, result->status) << result->body;
   Json::Value data = ParseJson(result->body)["data"];
-  EXPECT_EQ(content, data["content"].asString());
+  EXPECT_EQ("2d2d2d2d2d424547494e2043455254494649434154452d2d2d2d2d0a0001feff0d0a",
+            data["content_hex"].asString()) << "the content byte for byte";
   EXPECT_EQ(0600, data["mode"].asInt());
   EXPECT_EQ("../../evil name.pem", data["name"].asString()) << "the client's name, as text";
   const std::string path = data["path"].asString();
@@ -202,6 +198,12 @@ TEST_F(ServeTest, ServesThePageFolderAndNothingOutsideIt) {
       {"/sub/%2E%2E/%2E%2E/secret.txt", nullptr, nullptr},
       {"/..%2fsecret.txt", nullptr, nullptr},
       {"/index.html%00.js", nullptr, nullptr},
+      {"/%2e%2e/secret.txt", nullptr, nullptr},
+      {"/%2e%2e%2fsecret.txt", nullptr, nullptr},
+      {"/sub/%252e%252e/%252e%252e/secret.txt", nullptr, nullptr},
+      {"/sub/..\\..\\secret.txt", nullptr, nullptr},
+      {"/sub/..%5c..%5csecret.txt", nullptr, nullptr},
+      {"/%2fetc%2fpasswd", nullptr, nullptr},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.target);

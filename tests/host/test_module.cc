@@ -37,8 +37,13 @@ void ReadUpload(ORVA::APIRequest* request, ORVA::APIResponse* response) {
   data["path"] = path;
   data["mode"] = static_cast<int>(info.st_mode & 07777);
   data["name"] = request->GetParam("doc", Json::Value());
-  data["content"] = std::string((std::istreambuf_iterator<char>(file)),
-                                std::istreambuf_iterator<char>());
+  // In hexadecimal: answers are UTF-8, the upload need not be.
+  std::string hex;
+  for (std::istreambuf_iterator<char> byte(file), end; byte != end; ++byte) {
+    hex += "0123456789abcdef"[static_cast<unsigned char>(*byte) >> 4];
+    hex += "0123456789abcdef"[static_cast<unsigned char>(*byte) & 0x0F];
+  }
+  data["content_hex"] = hex;
   response->SetSuccess(data);
 }
 
