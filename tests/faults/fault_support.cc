@@ -244,12 +244,12 @@ void InstallOldStore(const TempDeviceRoot& root) {
   for (const char* key : {"/ssl.key/ca.key", "/ssl.key/server.key", "/.gen/server.key"}) {
     chmod((ssl + key).c_str(), 0400);
   }
-  ASSERT_TRUE(MakeRequest(root.Path("/uploads/request.key"),
-                          root.Path("/uploads/request.csr"), "/CN=client.local", 1024));
+  ASSERT_TRUE(MakeRequest(root.Path("/outside/request.key"),
+                          root.Path("/outside/request.csr"), "/CN=client.local", 1024));
   ASSERT_TRUE(MakeSignedCertificate(ssl + "/ssl.key/ca.key", ssl + "/ssl.crt/ca.crt",
-                                    root.Path("/uploads/server.key"),
-                                    root.Path("/uploads/server.crt"), "/CN=imported.local", 1024));
-  root.WriteFile("/uploads/server-ca.crt", ReadFile(ssl + "/ssl.crt/ca.crt"));
+                                    root.Path("/outside/server.key"),
+                                    root.Path("/outside/server.crt"), "/CN=imported.local", 1024));
+  root.WriteFile("/outside/server-ca.crt", ReadFile(ssl + "/ssl.crt/ca.crt"));
 }
 
 void ExpectStoreWhole(const TempDeviceRoot& root, const StoreState& before) {
@@ -406,7 +406,7 @@ std::vector<StoreWriter> StoreWriters() {
       {"CSR create", [](const TempDeviceRoot&) { return CallCreateCsr(); }},
       {"CSR renew", [](const TempDeviceRoot&) { return CallRenew(); }},
       {"CSR sign",
-       [](const TempDeviceRoot& root) { return CallSign(root.Path("/uploads/request.csr")); }},
+       [](const TempDeviceRoot& root) { return CallSign(root.Path("/outside/request.csr")); }},
       {"CRT create", [](const TempDeviceRoot&) { return CallCreateCrt(); }},
   };
 }
@@ -414,8 +414,8 @@ std::vector<StoreWriter> StoreWriters() {
 StoreWriter ImportWriter() {
   return {"import",
           [](const TempDeviceRoot& root) {
-            return CallImport(root.Path("/uploads/server.crt"), root.Path("/uploads/server.key"),
-                              root.Path("/uploads/server-ca.crt"));
+            return CallImport(root.Path("/outside/server.crt"), root.Path("/outside/server.key"),
+                              root.Path("/outside/server-ca.crt"));
           },
           5515};
 }

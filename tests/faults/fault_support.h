@@ -33,7 +33,9 @@ void RestoreStore(const TempDeviceRoot& root, const StoreState& state);
 // A complete store before a fault: a local CA (key, request, certificate),
 // a server pair it signed with an intermediate file, a pending request pair
 // and a signed certificate waiting in the generation area, and the serial
-// file. Keys have 1024 bits to keep the tests quick. Fails the test (fatal)
+// file. Outside the store, in "/outside" of the device root: a request to
+// sign (request.csr, request.key) and a server set the CA signed, to import
+// (server.crt, server.key, server-ca.crt). Keys have 1024 bits to keep the tests quick. Fails the test (fatal)
 // when a fixture cannot be made.
 void InstallOldStore(const TempDeviceRoot& root);
 
@@ -108,7 +110,7 @@ struct StoreWriter {
 // CSR create, renew, sign (of a request kept outside the store) and CRT
 // create: the writers that make their files with openssl.
 std::vector<StoreWriter> StoreWriters();
-// The import of the uploaded server set InstallOldStore made. It copies
+// The import of the server set InstallOldStore made outside the store. It copies
 // files into the store and runs openssl only to compare the pair.
 StoreWriter ImportWriter();
 // StoreWriters() and ImportWriter().

@@ -83,12 +83,12 @@ TEST_F(FullDisk, ImportRunningOutOfRoomAtAnyCopyKeepsTheOldSetAndNoCopy) {
     ORVA::APIResponse response = ImportWriter().call(root_);
     if (copied == 3) {
       EXPECT_EQ(Outcome::kSuccess, response.outcome()) << log.Text();
-      EXPECT_EQ(ReadFile(root_.Path("/uploads/server.crt")),
+      EXPECT_EQ(ReadFile(root_.Path("/outside/server.crt")),
                 ReadFile(root_.Path(std::string(kStore) + "/ssl.crt/server.crt")));
     } else {
       EXPECT_EQ(5515, response.error_code());
       EXPECT_TRUE(log.Contains("CA copy command failed:/bin/cp '" +
-                               root_.Path("/uploads/") + uploads[copied] + "'"))
+                               root_.Path("/outside/") + uploads[copied] + "'"))
           << log.Text();
       EXPECT_EQ(CertificateFiles(before_), CertificateFiles(ReadStore(root_)));
     }

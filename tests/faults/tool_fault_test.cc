@@ -91,10 +91,10 @@ TEST(ToolFaults, ImportWithTheToolFailingAtAnyRunOrMissingInstallsOnlyAMatchingS
   const StoreState before = ReadStore(root);
   const int runs = CountToolRuns(root, ImportWriter(), before);
   ASSERT_GT(runs, 0);
-  const std::string crt = root.Path("/uploads/server.crt");
-  const std::string inter = root.Path("/uploads/server-ca.crt");
-  for (const char* key : {"/uploads/server.key", "/uploads/request.key"}) {
-    const bool matching = std::string(key) == "/uploads/server.key";
+  const std::string crt = root.Path("/outside/server.crt");
+  const std::string inter = root.Path("/outside/server-ca.crt");
+  for (const char* key : {"/outside/server.key", "/outside/request.key"}) {
+    const bool matching = std::string(key) == "/outside/server.key";
     for (int failing = 0; failing <= runs; ++failing) {
       SCOPED_TRACE(std::string(key) + ", " +
                    (failing == 0 ? "no tool" : "tool run " + std::to_string(failing) + " of " +

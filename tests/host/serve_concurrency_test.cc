@@ -2,7 +2,6 @@
 // same time for a while; every call gets a whole answer, and the store and
 // the server are sound afterwards.
 
-#include <unistd.h>
 
 #include <atomic>
 #include <csignal>
@@ -101,11 +100,7 @@ class ServeConcurrencyTest : public testing::Test {
     // Every installed set then also reloads the HTTPS listener, beside the
     // calls that follow.
     root_.WriteFile("/usr/orva/etc/orva.conf", "runHTTPS=\"yes\"\n");
-    // The request to sign was made in the folder that becomes the server's
-    // upload folder, which must start empty.
-    request_ = ReadFile(root_.Path("/uploads/request.csr"));
-    unlink(root_.Path("/uploads/request.csr").c_str());
-    unlink(root_.Path("/uploads/request.key").c_str());
+    request_ = ReadFile(root_.Path("/outside/request.csr"));
     ASSERT_FALSE(request_.empty());
 
     const std::string work = root_.Path("/outside");
