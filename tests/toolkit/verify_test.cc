@@ -24,7 +24,6 @@ TEST(VerifyCrtAndKey, ResultsForPairsAndUnreadableFiles) {
   cases[] = {
       {"/a.crt", "/a.key", CYPHER_RSA, 0, ""},
       {"/a.crt", "/b.key", CYPHER_RSA, 1, ""},
-      {"/a.crt", "/b.key", CYPHER_NONE, 1, ""},
       {"/bad.crt", "/bad.key", CYPHER_RSA, -1, " get md5 failed crt="},
       {"/ec.crt", "/ec.key", CYPHER_NONE, -1, " get md5 failed crt="},
       {"/a.crt", "/bad.key", CYPHER_RSA, -1, " get md5 failed key="},
