@@ -39,7 +39,7 @@ class SignTest : public testing::Test {
 
 }  // namespace
 
-TEST_F(SignTest, LocalCaIsProvenForTenYearsAndSignsTheAliasesIntoAVerifiableCertificate) {
+TEST_F(SignTest, LocalCaIsProvenForTenYearsAndSignsVerifiableCertificatesWithAdvancingSerials) {
   for (const std::string& file : {kCaCrt, kCaKey, kCaCsr}) {
     EXPECT_EQ(0400, FileMode(Path(file))) << file;
   }
@@ -54,13 +54,9 @@ TEST_F(SignTest, LocalCaIsProvenForTenYearsAndSignsTheAliasesIntoAVerifiableCert
   std::string text = CertificateText(Path(kOut));
   EXPECT_NE(std::string::npos, text.find("DNS:nas.local, IP Address:192.168.1.10")) << text;
   EXPECT_EQ(std::string::npos, text.find("CA:TRUE")) << text;
-  EXPECT_NE(std::string::npos, ReadFile(Path(kServerExt))
-                                   .find("subjectAltName = \"DNS:nas.local, IP:192.168.1.10\"\n"));
   EXPECT_EQ("", TemporaryFilesIn(Path("/usr/orva/etc/ssl/.gen")));
-}
 
-TEST_F(SignTest, SerialFileIsMadeOnceAndAdvancedByEachSigning) {
-  ASSERT_EQ(0, SignServer(""));
+  // The serial file is made once and advanced by each signing.
   std::string first = ReadFile(Path(kSerial));
   ASSERT_EQ(0, SignServer(""));
   std::string second = ReadFile(Path(kSerial));
@@ -174,7 +170,10 @@ TEST(GenCASet, FirstFailedStepEndsTheSetWithItsResult) {
   for (const auto& c : cases) {
     SCOPED_TRACE(c.message);
     TempDeviceRoot root;
-    if (c.failing_subcommand != nullptr) FailToolSubcommand(root, c.failing_subcommand);
+    if (c.failing_subcommand != nullptr) {
+      root.WriteScript("/usr/orva/bin/openssl", "if [ \"$1\" = " + std::string(c.failing_subcommand) +
+                                                    " ]; then exit 1; fi\nexec /usr/bin/openssl \"$@\"");
+    }
     LogCapture log;
     CSR_ARGUMENT subject = FullSubject();
     subject.country = c.country;
