@@ -1,9 +1,7 @@
-#include <ftw.h>
 #include <grp.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <functional>
 #include <string>
 
 #include <gtest/gtest.h>
@@ -31,29 +29,6 @@ void InstallStandIn(const TempDeviceRoot& root, std::string write, int status,
                            "  previous=$arg\n"
                            "done\n"
                            "exit " + std::to_string(status));
-}
-
-constexpr uid_t kNobody = 65534;
-
-int HandToNobody(const char* path, const struct stat*, int, struct FTW*) {
-  return lchown(path, kNobody, kNobody);
-}
-
-// Runs `body` as an unprivileged user: when the tests run as root, in a
-// child process that owns the device root and has given up root's rights;
-// otherwise directly. True when `body` returned true.
-bool RunAsUnprivilegedUser(const TempDeviceRoot& root, const std::function<bool()>& body) {
-  if (geteuid() != 0) return body();
-  if (nftw(root.root().c_str(), HandToNobody, 16, FTW_PHYS) != 0) return false;
-  pid_t child = fork();
-  if (child == 0) {
-    bool done = setgroups(0, nullptr) == 0 && setgid(kNobody) == 0 && setuid(kNobody) == 0 &&
-                geteuid() == kNobody && body();
-    _exit(done ? 0 : 1);
-  }
-  int status = 0;
-  return child > 0 && waitpid(child, &status, 0) == child && WIFEXITED(status) &&
-         WEXITSTATUS(status) == 0;
 }
 
 }  // namespace
@@ -115,15 +90,25 @@ TEST(GenKey, HandsOnlyExistingSeedFilesToTheTool) {
 }
 
 // The machine's openssl may be reserved to root; what is proved here is
-// that a read-only key is replaced, which a stand-in shows as well.
+// that a read-only key is replaced, which a stand-in shows as well. Run as
+// root, the calls run in a child that owns the device root and has given up
+// root's rights.
 TEST(GenKey, UserWithoutRootRightsReplacesAReadOnlyKeyTwice) {
+  constexpr uid_t kNobody = 65534;
   TempDeviceRoot root;
   root.WriteFile(kKey, "old key\n", 0400);
   InstallStandIn(root, "cat @ > \"$arg\"", 0);
-  std::string key = root.Path(kKey);
-  EXPECT_TRUE(RunAsUnprivilegedUser(root, [&key] {
-    return genKey(key.c_str(), 1024) == 0 && genKey(key.c_str(), 1024) == 0;
-  }));
+  ASSERT_TRUE(geteuid() != 0 || RunForTest("chown -R 65534:65534 '" + root.root() + "'"));
+  const std::string key = root.Path(kKey);
+  pid_t child = fork();
+  if (child == 0) {
+    bool unprivileged = geteuid() != 0 || (setgroups(0, nullptr) == 0 && setgid(kNobody) == 0 &&
+                                           setuid(kNobody) == 0 && geteuid() == kNobody);
+    _exit(unprivileged && genKey(key.c_str(), 1024) == 0 && genKey(key.c_str(), 1024) == 0 ? 0 : 1);
+  }
+  int status = 0;
+  ASSERT_EQ(child, waitpid(child, &status, 0));
+  EXPECT_EQ(0, status) << "both keys made as that user";
   EXPECT_EQ(0400, FileMode(key));
   EXPECT_EQ(ReadFile(root.Path("/fixture.key")), ReadFile(key));
   EXPECT_EQ("", TemporaryFilesIn(root.Path(kKeyFolder)));

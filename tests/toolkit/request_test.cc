@@ -67,7 +67,6 @@ TEST_F(GenCsrTest, RefusedSubjectsWriteNothing) {
   const char kArgument[] = " CSR Argument error[0x";
   const struct { std::string CSR_ARGUMENT::*member; std::string value; const char* message; }
   cases[] = {
-      {&CSR_ARGUMENT::country, "", kCountry},
       {&CSR_ARGUMENT::country, "TWN", kCountry},
       {&CSR_ARGUMENT::country, "T\n", kArgument},
       {&CSR_ARGUMENT::common_name, "a\ncommonName = evil", kArgument},
