@@ -17,62 +17,60 @@ const char kServerKey[] = "/usr/orva/etc/ssl/ssl.key/server.key";
 const char kInterCrt[] = "/usr/orva/etc/ssl/ssl.intercrt/server-ca.crt";
 const char kBom[] = "\xEF\xBB\xBF";
 
-// Certificate sets made once with plain openssl: a root, an intermediate CA
-// it signed, and server certificates the intermediate signed (RSA and EC),
-// with their keys in several PEM forms.
-class Materials {
- public:
-  static void Make() {
-    char pattern[] = "/tmp/orva-upload-materials-XXXXXX";
-    ASSERT_NE(nullptr, mkdtemp(pattern));
-    dir_ = pattern;
-    const char* commands[] = {
-        "openssl req -x509 -newkey rsa:2048 -nodes -keyout root.key -out root.crt -days 30"
-        " -subj '/CN=Upload Test Root'",
-        "openssl req -newkey rsa:2048 -nodes -keyout inter.key -out inter.csr"
-        " -subj '/CN=Upload Test Intermediate'",
-        "printf 'basicConstraints=critical,CA:TRUE\\nkeyUsage=keyCertSign,cRLSign\\n' > ca.ext",
-        "openssl x509 -req -in inter.csr -CA root.crt -CAkey root.key -set_serial 2 -days 30"
-        " -extfile ca.ext -out inter.crt",
-        "openssl req -newkey rsa:2048 -nodes -keyout server.p8 -out server.csr"
-        " -subj '/CN=nas.local'",
-        "openssl x509 -req -in server.csr -CA inter.crt -CAkey inter.key -set_serial 3"
-        " -days 30 -out server.crt",
-        "openssl rsa -in server.p8 -traditional -out server.key",
-        "openssl genrsa -traditional -out other.key 2048",
-        "openssl pkey -in other.key -out other.p8",
-        "openssl ecparam -name prime256v1 -genkey -noout -out ec.key",
-        "openssl pkey -in ec.key -out ec.p8",
-        "openssl req -new -key ec.key -out ec.csr -subj '/CN=ec.nas.local'",
-        "openssl x509 -req -in ec.csr -CA inter.crt -CAkey inter.key -set_serial 4 -days 30"
-        " -out ec.crt",
-        "openssl ecparam -name prime256v1 -genkey -noout -out ec_other.key",
-        "openssl pkcs8 -topk8 -in server.p8 -passout pass:secret -out server.enc",
-        "openssl rsa -in server.p8 -traditional -aes128 -passout pass:secret"
-        " -out server_trad.enc",
-        "openssl dsaparam -out dsa.param 1024",
-        "openssl req -x509 -newkey dsa:dsa.param -nodes -keyout dsa.p8 -subj /CN=dsa -out dsa.crt",
-    };
-    for (const char* command : commands) {
-      ASSERT_TRUE(RunForTest("cd '" + dir_ + "' && " + command)) << command;
-    }
+// The folder of certificate sets made once with plain openssl: a root, an
+// intermediate CA it signed, and server certificates the intermediate
+// signed (RSA and EC), with their keys in several PEM forms.
+std::string materials_folder;
+
+std::string Material(const std::string& name) { return ReadFile(materials_folder + "/" + name); }
+
+void MakeMaterials() {
+  char pattern[] = "/tmp/orva-upload-materials-XXXXXX";
+  ASSERT_NE(nullptr, mkdtemp(pattern));
+  materials_folder = pattern;
+  const char* commands[] = {
+      "openssl req -x509 -newkey rsa:2048 -nodes -keyout root.key -out root.crt -days 30"
+      " -subj '/CN=Upload Test Root'",
+      "openssl req -newkey rsa:2048 -nodes -keyout inter.key -out inter.csr"
+      " -subj '/CN=Upload Test Intermediate'",
+      "printf 'basicConstraints=critical,CA:TRUE\\nkeyUsage=keyCertSign,cRLSign\\n' > ca.ext",
+      "openssl x509 -req -in inter.csr -CA root.crt -CAkey root.key -set_serial 2 -days 30"
+      " -extfile ca.ext -out inter.crt",
+      "openssl req -newkey rsa:2048 -nodes -keyout server.p8 -out server.csr"
+      " -subj '/CN=nas.local'",
+      "openssl x509 -req -in server.csr -CA inter.crt -CAkey inter.key -set_serial 3"
+      " -days 30 -out server.crt",
+      "openssl rsa -in server.p8 -traditional -out server.key",
+      "openssl genrsa -traditional -out other.key 2048",
+      "openssl pkey -in other.key -out other.p8",
+      "openssl ecparam -name prime256v1 -genkey -noout -out ec.key",
+      "openssl pkey -in ec.key -out ec.p8",
+      "openssl req -new -key ec.key -out ec.csr -subj '/CN=ec.nas.local'",
+      "openssl x509 -req -in ec.csr -CA inter.crt -CAkey inter.key -set_serial 4 -days 30"
+      " -out ec.crt",
+      "openssl ecparam -name prime256v1 -genkey -noout -out ec_other.key",
+      "openssl pkcs8 -topk8 -in server.p8 -passout pass:secret -out server.enc",
+      "openssl rsa -in server.p8 -traditional -aes128 -passout pass:secret"
+      " -out server_trad.enc",
+      "openssl dsaparam -out dsa.param 1024",
+      "openssl req -x509 -newkey dsa:dsa.param -nodes -keyout dsa.p8 -subj /CN=dsa -out dsa.crt",
+  };
+  for (const char* command : commands) {
+    ASSERT_TRUE(RunForTest("cd '" + materials_folder + "' && " + command)) << command;
   }
-  static void Remove() { RunForTest("rm -rf '" + dir_ + "'"); }
-  static std::string Read(const std::string& name) { return ReadFile(dir_ + "/" + name); }
-
- private:
-  static std::string dir_;
-};
-
-std::string Materials::dir_;
+}
 
 // The files of one upload, by parameter ("cert_tmp", ...) and content.
 using Upload = std::map<std::string, std::string>;
 
+// A store holding an earlier set.
+const std::pair<const char*, const char*> kOldSet[] = {
+    {kServerCrt, "old certificate"}, {kServerKey, "old key"}, {kInterCrt, "old intermediate"}};
+
 class CertificateImport : public testing::Test {
  protected:
-  static void SetUpTestSuite() { Materials::Make(); }
-  static void TearDownTestSuite() { Materials::Remove(); }
+  static void SetUpTestSuite() { MakeMaterials(); }
+  static void TearDownTestSuite() { RunForTest("rm -rf '" + materials_folder + "'"); }
 
   // Writes each file of `upload` into `folder` of the device root and runs
   // the import with their paths added to `params`.
@@ -88,26 +86,20 @@ class CertificateImport : public testing::Test {
     return response;
   }
 
-  // A store holding an earlier set.
   void InstallOldSet() {
-    root_.WriteFile(kServerCrt, "old certificate", 0400);
-    root_.WriteFile(kServerKey, "old key", 0400);
-    root_.WriteFile(kInterCrt, "old intermediate", 0400);
+    for (const auto& [path, content] : kOldSet) root_.WriteFile(path, content, 0400);
   }
-
   void ExpectOldSet() {
-    EXPECT_EQ("old certificate", ReadFile(root_.Path(kServerCrt)));
-    EXPECT_EQ("old key", ReadFile(root_.Path(kServerKey)));
-    EXPECT_EQ("old intermediate", ReadFile(root_.Path(kInterCrt)));
+    for (const auto& [path, content] : kOldSet) EXPECT_EQ(content, ReadFile(root_.Path(path)));
   }
 
   TempDeviceRoot root_;
 };
 
 Upload RsaSet(bool withIntermediate = true) {
-  Upload upload = {{"cert_tmp", Materials::Read("server.crt")},
-                   {"key_tmp", Materials::Read("server.key")}};
-  if (withIntermediate) upload["inter_cert_tmp"] = Materials::Read("inter.crt");
+  Upload upload = {{"cert_tmp", Material("server.crt")},
+                   {"key_tmp", Material("server.key")}};
+  if (withIntermediate) upload["inter_cert_tmp"] = Material("inter.crt");
   return upload;
 }
 
@@ -152,7 +144,7 @@ TEST_F(CertificateImport, ActivatesOnlyAfterTheStoreHoldsTheNewSet) {
                     "echo \"plugin $1 $2\" >> \"$ORVA_ROOT/events.log\"");
 
   Upload mismatching = RsaSet();
-  mismatching["key_tmp"] = Materials::Read("other.key");
+  mismatching["key_tmp"] = Material("other.key");
   EXPECT_EQ(5514, Import(mismatching).error_code());
   EXPECT_FALSE(FileExists(root_.Path("/events.log"))) << "a refused import activates nothing";
 
@@ -161,7 +153,7 @@ TEST_F(CertificateImport, ActivatesOnlyAfterTheStoreHoldsTheNewSet) {
 }
 
 TEST_F(CertificateImport, RefusedUploadsLeaveTheStoreUntouched) {
-  const auto M = Materials::Read;
+  const auto M = Material;
   const std::string crt = M("server.crt"), key = M("server.key"), inter = M("inter.crt");
   // A PEM block of `label` whose body is no DER at all.
   auto garbage = [](const std::string& label) {
@@ -216,9 +208,9 @@ TEST_F(CertificateImport, EcCertificateIsImportedWithItsKeyInBothForms) {
   ASSERT_TRUE(RunForTest("rm -rf '" + root_.Path("/usr/orva/etc/ssl") + "'"));
   for (const char* key : {"ec.key", "ec.p8"}) {
     SCOPED_TRACE(key);
-    Upload upload = {{"cert_tmp", Materials::Read("ec.crt")},
-                     {"key_tmp", Materials::Read(key)},
-                     {"inter_cert_tmp", Materials::Read("inter.crt")}};
+    Upload upload = {{"cert_tmp", Material("ec.crt")},
+                     {"key_tmp", Material(key)},
+                     {"inter_cert_tmp", Material("inter.crt")}};
     ExpectSuccess(Import(upload), false);
     EXPECT_EQ(upload["cert_tmp"], ReadFile(root_.Path(kServerCrt))) << "store folders are made";
     EXPECT_EQ(upload["key_tmp"], ReadFile(root_.Path(kServerKey)));
@@ -229,7 +221,7 @@ TEST_F(CertificateImport, EcCertificateIsImportedWithItsKeyInBothForms) {
 
 TEST_F(CertificateImport, CopyCommandsTakeQuotedPathsWholeAndTheirFailuresAnswer5515) {
   ExpectSuccess(Import(RsaSet(), "/it's an upload/"), false);
-  EXPECT_EQ(Materials::Read("server.crt"), ReadFile(root_.Path(kServerCrt)));
+  EXPECT_EQ(Material("server.crt"), ReadFile(root_.Path(kServerCrt)));
 
   // Each quote takes four bytes on the command line: this folder fits the
   // file system but not the copy command's 8192 bytes.
