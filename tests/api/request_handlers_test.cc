@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include "api/certificate.h"
+#include "api/csr_argument.h"
 #include "tests/support/certificates.h"
 #include "tests/support/inspect.h"
 #include "tests/support/test_support.h"
@@ -79,11 +80,40 @@ std::string Contents(const TempDeviceRoot& root, const std::vector<const char*>&
   return contents;
 }
 
+std::string Fields(const CSR_ARGUMENT& subject) {
+  return subject.country + "|" + subject.state + "|" + subject.city + "|" +
+         subject.organization + "|" + subject.department + "|" + subject.common_name + "|" +
+         subject.email;
+}
+
 }  // namespace
 
+TEST(FillCSRInfo, ReadsTheSelectedSetAndFallsBackToDefaults) {
+  Json::Value params(Json::objectValue);
+  params["ca_country"] = "DE";
+  params["country"] = "FR";
+  params["state"] = "";
+  params["organization"] = "O'Reilly \"quoted\"";
+  ORVA::APIRequest request("ORVA.Core.Certificate.CRT", "create", 1, params);
+  CSR_ARGUMENT server, ca;
+  ASSERT_EQ(0, fillCSRInfo(&request, &server, false));
+  ASSERT_EQ(0, fillCSRInfo(&request, &ca, true));
+  EXPECT_EQ("FR||Taipel|O'Reilly \"quoted\"|Department|server.example.com|admin@server.example.com",
+            Fields(server))
+      << "an empty text stays empty";
+  EXPECT_EQ("DE|Taipei|Taipel|Organization|Department|server.example.com|ca@server.example.com",
+            Fields(ca));
+  LogCapture log;
+  EXPECT_EQ(-1, fillCSRInfo(&request, nullptr, false));
+  EXPECT_TRUE(log.Contains(" sanity check failed\n")) << log.Text();
+}
+
+// The key length comes as text here and as a number in CRT create.
 TEST(CsrCreate, LeavesAPendingPairWithTheTypedSubjectThatAFailureKeepsExactly) {
   TempDeviceRoot root;
-  ORVA::APIResponse response = Call(doCertificateCreateCSR_v1, Subjects());
+  Json::Value params = Subjects();
+  params["key_length"] = "1024";
+  ORVA::APIResponse response = Call(doCertificateCreateCSR_v1, params);
   ASSERT_EQ(Outcome::kSuccess, response.outcome()) << response.error_code();
   EXPECT_EQ(Json::Value(Json::objectValue), response.data());
   EXPECT_EQ(0400, FileMode(root.Path(kGenKey)));
@@ -94,11 +124,6 @@ TEST(CsrCreate, LeavesAPendingPairWithTheTypedSubjectThatAFailureKeepsExactly) {
       << "an empty department is left out";
   EXPECT_TRUE(RequestMatchesKey(root.Path(kGenCsr), root.Path(kGenKey)));
   EXPECT_EQ(1024, RequestKeyBits(root.Path(kGenCsr)));
-
-  Json::Value params = Subjects();
-  params["key_length"] = "3072";
-  ASSERT_EQ(Outcome::kSuccess, Call(doCertificateCreateCSR_v1, params).outcome());
-  EXPECT_EQ(3072, PrivateKeyBits(root.Path(kGenKey))) << "a length given as text";
   const std::string pending = Contents(root, {kGenKey, kGenCsr});
   const struct { const char *field, *value, *logged; } cases[] = {
       {"key_length", "0", " genKey Error path: /usr/orva/etc/ssl/.gen/server.key\n"},
