@@ -160,7 +160,7 @@ TEST(CsrRenew, RepeatsTheInstalledSubjectAndKeySizeAndNeedsACertificate) {
     LogCapture log;
     EXPECT_EQ(5501, Call(doCertificateRenew_v1).error_code());
     EXPECT_TRUE(log.Contains(" read x509 failed[0x") &&
-                log.Contains(" Getting key length from /usr/orva/etc/ssl/ssl.crt/server.crt failed[0x"))
+                log.Contains(" Getting key length from " + std::string(kServerCrt) + " failed[0x"))
         << log.Text();
     EXPECT_FALSE(FileExists(root.Path(kGenKey)));
   }

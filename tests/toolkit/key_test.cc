@@ -90,9 +90,9 @@ TEST(GenKey, HandsOnlyExistingSeedFilesToTheTool) {
 }
 
 // The machine's openssl may be reserved to root; what is proved here is
-// that a read-only key is replaced, which a stand-in shows as well. Run as
-// root, the calls run in a child that owns the device root and has given up
-// root's rights.
+// that a read-only key is replaced, which a stand-in shows as well. The
+// calls run in a child process; under root it owns the device root and
+// gives up root's rights first.
 TEST(GenKey, UserWithoutRootRightsReplacesAReadOnlyKeyTwice) {
   constexpr uid_t kNobody = 65534;
   TempDeviceRoot root;

@@ -159,19 +159,18 @@ TEST(GenSerial, MachineAddressStandsInForAMissingMacFile) {
 
 TEST(GenCASet, FirstFailedStepEndsTheSetWithItsResult) {
   const struct { const char* country; int bits; const char* failing_subcommand; int result;
-                 const char* message; } cases[] = {
-      {"TW", 0, nullptr, -1, " genCAKey() failed\n"},
-      {"TWN", 1024, nullptr, -2, " genCACsr() failed\n"},
+                 const char* message; } cases[] = {  // "" fails no subcommand
+      {"TW", 0, "", -1, " genCAKey() failed\n"},
+      {"TWN", 1024, "", -2, " genCACsr() failed\n"},
       {"TW", 1024, "x509", -1, " genCACrt() failed\n"},
       {"TW", 1024, "md5", -1, " Root certificate and key is not matching\n"},
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(c.message);
     TempDeviceRoot root;
-    if (c.failing_subcommand != nullptr) {
-      root.WriteScript("/usr/orva/bin/openssl", "if [ \"$1\" = " + std::string(c.failing_subcommand) +
-                                                    " ]; then exit 1; fi\nexec /usr/bin/openssl \"$@\"");
-    }
+    root.WriteScript("/usr/orva/bin/openssl",
+                     "if [ \"$1\" = '" + std::string(c.failing_subcommand) +
+                         "' ]; then exit 1; fi\nexec /usr/bin/openssl \"$@\"");
     LogCapture log;
     CSR_ARGUMENT subject = FullSubject();
     subject.country = c.country;
