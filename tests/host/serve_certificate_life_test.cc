@@ -24,15 +24,6 @@ PresentedCertificates ProbeFor(int port, const std::string& commonName) {
   });
 }
 
-httplib::MultipartFormDataItems ImportForm(const std::string& cert, const std::string& key,
-                                           const std::string& chain) {
-  return {{"api", "ORVA.Core.Certificate", "", ""},
-          {"method", "import", "", ""},
-          {"cert", cert, "server.crt", "application/x-pem-file"},
-          {"key", key, "server.key", "application/x-pem-file"},
-          {"inter_cert", chain, "chain.crt", "application/x-pem-file"}};
-}
-
 }  // namespace
 
 TEST(ServeCertificateLife, CreateImportRefuseAndExportOverHttpChangeWhatHttpsPresents) {

@@ -59,15 +59,6 @@ void AddSubject(const char* prefix, const char* commonName, httplib::Params* for
   for (const auto& field : fields) form->emplace(std::string(prefix) + field[0], field[1]);
 }
 
-httplib::MultipartFormDataItems ImportForm(const std::string& cert, const std::string& key,
-                                           const std::string& chain) {
-  return {{"api", "ORVA.Core.Certificate", "", ""},
-          {"method", "import", "", ""},
-          {"cert", cert, "server.crt", "application/x-pem-file"},
-          {"key", key, "server.key", "application/x-pem-file"},
-          {"inter_cert", chain, "chain.crt", "application/x-pem-file"}};
-}
-
 // Empty when `result` is the answer `kind` must get, else what is wrong.
 std::string Misanswer(const CallKind& kind, const httplib::Result& result) {
   if (!result) return "no answer: " + httplib::to_string(result.error());

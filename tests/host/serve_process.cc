@@ -185,6 +185,15 @@ int RawStatus(const std::string& response) {
   return std::atoi(response.c_str() + 9);
 }
 
+httplib::MultipartFormDataItems ImportForm(const std::string& cert, const std::string& key,
+                                           const std::string& chain) {
+  return {{"api", "ORVA.Core.Certificate", "", ""},
+          {"method", "import", "", ""},
+          {"cert", cert, "server.crt", "application/x-pem-file"},
+          {"key", key, "server.key", "application/x-pem-file"},
+          {"inter_cert", chain, "chain.crt", "application/x-pem-file"}};
+}
+
 Json::Value HostError(int code) {
   Json::Value answer(Json::objectValue);
   answer["success"] = false;

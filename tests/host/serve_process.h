@@ -62,6 +62,10 @@ std::string RawExchange(int port, const std::string& request, int firstReplyMs =
 // The HTTP status of a raw response ("HTTP/1.1 404 ..."), or 0.
 int RawStatus(const std::string& response);
 
+// The multipart form of an import of the certificate, key and chain texts.
+httplib::MultipartFormDataItems ImportForm(const std::string& cert, const std::string& key,
+                                           const std::string& chain);
+
 // The host's answer to a request it refuses with HTTP status `code`.
 Json::Value HostError(int code);
 
