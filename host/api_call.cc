@@ -4,6 +4,7 @@
 #include <memory>
 #include <sstream>
 
+#include "platform/olib/olib_unicode.h"
 #include "platform/webapi/api_request.h"
 #include "platform/webapi/api_response.h"
 
@@ -12,34 +13,15 @@ namespace {
 constexpr char kReplacementCharacter[] = "\xEF\xBF\xBD";  // U+FFFD
 
 // The length of the well-formed UTF-8 sequence that starts at text[at], or
-// 0 when none does (stray or cut-short bytes, overlong forms, surrogates,
-// code points past U+10FFFF).
+// 0 when none does. No proper prefix of a sequence is well-formed, so the
+// shortest well-formed prefix is exactly one sequence.
 size_t Utf8SequenceLength(const std::string& text, size_t at) {
-  unsigned char lead = static_cast<unsigned char>(text[at]);
-  if (lead < 0x80) return 1;
-  size_t length;
-  unsigned char low = 0x80, high = 0xBF;  // the second byte's range
-  if (lead >= 0xC2 && lead <= 0xDF) {
-    length = 2;
-  } else if (lead >= 0xE0 && lead <= 0xEF) {
-    length = 3;
-    if (lead == 0xE0) low = 0xA0;
-    if (lead == 0xED) high = 0x9F;
-  } else if (lead >= 0xF0 && lead <= 0xF4) {
-    length = 4;
-    if (lead == 0xF0) low = 0x90;
-    if (lead == 0xF4) high = 0x8F;
-  } else {
-    return 0;
+  char sequence[5] = {};
+  for (size_t length = 1; length <= 4 && at + length <= text.size(); ++length) {
+    sequence[length - 1] = text[at + length - 1];
+    if (OLIBCUnicodeIsUTF8(sequence)) return length;
   }
-  if (text.size() - at < length) return 0;
-  for (size_t i = 1; i < length; ++i) {
-    unsigned char next = static_cast<unsigned char>(text[at + i]);
-    if (next < low || next > high) return 0;
-    low = 0x80;
-    high = 0xBF;
-  }
-  return length;
+  return 0;
 }
 
 }  // namespace
@@ -111,6 +93,7 @@ std::string ToOneLineJson(const Json::Value& value) {
   // names are read byte for byte: what is not UTF-8 is replaced. Bytes from
   // 0x80 up occur only inside strings, so the JSON stays whole.
   std::string json = Json::writeString(builder, value);
+  if (OLIBCUnicodeIsUTF8(json.c_str())) return json;
   std::string valid;
   valid.reserve(json.size());
   for (size_t at = 0; at < json.size();) {
