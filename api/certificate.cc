@@ -5,7 +5,7 @@
 
 #include "common/api_errors.h"
 #include "platform/webapi/parameter_checker.h"
-#include "upload/uploadsslca.h"
+#include "upload/sslca_form_handler.h"
 
 namespace {
 

@@ -3,17 +3,17 @@
 #include <cstdio>
 #include <string>
 
-#include "api/activation.h"
 #include "api/certificate.h"
-#include "api/csr_argument.h"
-#include "api/generation_area.h"
 #include "api/request_values.h"
+#include "api/subject_reader.h"
 #include "common/api_errors.h"
 #include "common/log.h"
 #include "common/store_paths.h"
 #include "platform/olib/olib_file.h"
 #include "platform/olib/orva_root.h"
 #include "platform/webapi/api_polling.h"
+#include "toolkit/activation.h"
+#include "toolkit/generation_area.h"
 #include "toolkit/mkcert.h"
 #include "toolkit/store_file.h"
 

@@ -1,7 +1,7 @@
 #include "api/certificate.h"
-#include "api/csr_argument.h"
 #include "api/csr_generate.h"
 #include "api/request_values.h"
+#include "api/subject_reader.h"
 #include "common/api_errors.h"
 #include "common/log.h"
 

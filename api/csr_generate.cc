@@ -3,10 +3,10 @@
 #include <cstdio>
 #include <string>
 
-#include "api/generation_area.h"
 #include "common/log.h"
 #include "common/store_paths.h"
 #include "platform/olib/orva_root.h"
+#include "toolkit/generation_area.h"
 #include "toolkit/mkcert.h"
 
 namespace {

@@ -1,7 +1,7 @@
 #ifndef ORVA_API_CSR_GENERATE_H_
 #define ORVA_API_CSR_GENERATE_H_
 
-#include "api/csr_argument.h"
+#include "api/subject_reader.h"
 
 // Makes a new RSA key of `keyLength` bits and a request for `record` as the
 // pending pair of the generation area ("/usr/orva/etc/ssl/.gen/server.key"

@@ -6,8 +6,8 @@
 
 #include "api/certificate.h"
 #include "api/certificate_info.h"
-#include "api/csr_argument.h"
 #include "api/csr_generate.h"
+#include "api/subject_reader.h"
 #include "common/api_errors.h"
 #include "common/log.h"
 #include "common/pem_password.h"

@@ -1,13 +1,13 @@
 #include <string>
 
 #include "api/certificate.h"
-#include "api/generation_area.h"
 #include "common/api_errors.h"
 #include "common/log.h"
 #include "common/store_paths.h"
 #include "platform/olib/orva_root.h"
+#include "toolkit/generation_area.h"
 #include "toolkit/mkcert.h"
-#include "upload/uploadsslca.h"
+#include "upload/sslca_form_handler.h"
 
 void handleSignCSRAction(ORVA::APIRequest* request, ORVA::APIResponse* response) {
   std::string request_path = request->GetParam("csr_tmp", Json::Value()).asString();

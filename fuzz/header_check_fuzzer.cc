@@ -11,7 +11,7 @@
 
 #include "common/api_errors.h"
 #include "fuzz/fuzz_scratch.h"
-#include "upload/uploadsslca.h"
+#include "upload/sslca_form_handler.h"
 
 namespace {
 

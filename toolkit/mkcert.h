@@ -4,11 +4,11 @@
 #include <string>
 #include <vector>
 
-#include "api/csr_argument.h"
 #include "common/raii.h"
 #include "common/shell_command.h"
 #include "platform/olib/olib_szlist.h"
 #include "platform/olib/olib_types.h"
+#include "toolkit/csr_argument.h"
 
 // The certificate toolkit: keys, requests and certificates made with the
 // device's openssl tool, key/certificate matching and chain verification.

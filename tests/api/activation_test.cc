@@ -4,8 +4,8 @@
 
 #include <gtest/gtest.h>
 
-#include "api/activation.h"
 #include "tests/support/test_support.h"
+#include "toolkit/activation.h"
 
 namespace {
 

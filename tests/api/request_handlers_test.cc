@@ -4,7 +4,7 @@
 #include <gtest/gtest.h>
 
 #include "api/certificate.h"
-#include "api/csr_argument.h"
+#include "api/subject_reader.h"
 #include "tests/support/certificates.h"
 #include "tests/support/inspect.h"
 #include "tests/support/test_support.h"

@@ -17,9 +17,9 @@
 #include <gtest/gtest.h>
 
 #include "api/certificate.h"
-#include "platform/webapi/api_download.h"
 #include "common/pem_password.h"
 #include "common/raii.h"
+#include "platform/webapi/api_download.h"
 #include "tests/support/certificates.h"
 
 namespace {

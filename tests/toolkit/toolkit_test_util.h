@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "api/csr_argument.h"
+#include "api/subject_reader.h"
 #include "tests/support/test_support.h"
 
 // A complete subject with a two-letter country.

@@ -1,4 +1,4 @@
-#include "api/generation_area.h"
+#include "toolkit/generation_area.h"
 
 #include <sys/stat.h>
 

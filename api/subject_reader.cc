@@ -1,4 +1,4 @@
-#include "api/csr_argument.h"
+#include "api/subject_reader.h"
 
 #include "common/log.h"
 

@@ -1,5 +1,5 @@
-#ifndef ORVA_UPLOAD_UPLOADSSLCA_H_
-#define ORVA_UPLOAD_UPLOADSSLCA_H_
+#ifndef ORVA_UPLOAD_SSLCA_FORM_HANDLER_H_
+#define ORVA_UPLOAD_SSLCA_FORM_HANDLER_H_
 
 #include <json/json.h>
 
@@ -91,4 +91,4 @@ class SSLCAFormHandler : public ServerFormHandler {
   void DownloadAction(ORVA::APIRequest* request, ORVA::APIResponse* response);
 };
 
-#endif  // ORVA_UPLOAD_UPLOADSSLCA_H_
+#endif  // ORVA_UPLOAD_SSLCA_FORM_HANDLER_H_

@@ -4,14 +4,14 @@
 
 #include <string>
 
-#include "api/activation.h"
 #include "common/api_errors.h"
 #include "common/log.h"
 #include "common/store_paths.h"
 #include "platform/olib/olib_file.h"
 #include "platform/olib/orva_root.h"
+#include "toolkit/activation.h"
+#include "upload/sslca_form_handler.h"
 #include "upload/staged_copy.h"
-#include "upload/uploadsslca.h"
 
 namespace {
 

@@ -1,5 +1,5 @@
-#ifndef ORVA_API_GENERATION_AREA_H_
-#define ORVA_API_GENERATION_AREA_H_
+#ifndef ORVA_TOOLKIT_GENERATION_AREA_H_
+#define ORVA_TOOLKIT_GENERATION_AREA_H_
 
 #include <string>
 
@@ -16,4 +16,4 @@ bool MakeGenerationArea();
 // renamed before the request ends.
 std::string GenerationWorkPath(const char* name);
 
-#endif  // ORVA_API_GENERATION_AREA_H_
+#endif  // ORVA_TOOLKIT_GENERATION_AREA_H_

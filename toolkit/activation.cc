@@ -1,4 +1,4 @@
-#include "api/activation.h"
+#include "toolkit/activation.h"
 
 #include <string>
 

@@ -1,21 +1,10 @@
-#ifndef ORVA_API_CSR_ARGUMENT_H_
-#define ORVA_API_CSR_ARGUMENT_H_
+#ifndef ORVA_API_SUBJECT_READER_H_
+#define ORVA_API_SUBJECT_READER_H_
 
 #include <string>
 
 #include "platform/webapi/api_request.h"
-
-// The subject of a certificate request. The record enforces nothing; request
-// generation decides what it accepts.
-typedef struct _tag_CSR_ARGUMENT {
-  std::string country;
-  std::string state;
-  std::string city;
-  std::string organization;
-  std::string department;
-  std::string common_name;
-  std::string email;
-} CSR_ARGUMENT;
+#include "toolkit/csr_argument.h"
 
 // Fills all seven members of `record` from the request's parameters: the
 // "ca_" names when `ca` is true, the plain names otherwise. An absent
@@ -25,4 +14,4 @@ typedef struct _tag_CSR_ARGUMENT {
 // read) when `record` is null.
 int fillCSRInfo(ORVA::APIRequest* request, CSR_ARGUMENT* record, bool ca);
 
-#endif  // ORVA_API_CSR_ARGUMENT_H_
+#endif  // ORVA_API_SUBJECT_READER_H_

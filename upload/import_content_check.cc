@@ -10,7 +10,7 @@
 #include "common/log.h"
 #include "common/pem_password.h"
 #include "common/raii.h"
-#include "upload/uploadsslca.h"
+#include "upload/sslca_form_handler.h"
 
 namespace {
 

@@ -1,4 +1,4 @@
-#include "upload/uploadsslca.h"
+#include "upload/sslca_form_handler.h"
 
 SSLCAFormHandler::SSLCAFormHandler() : ServerFormHandler(false, nullptr) {}
 

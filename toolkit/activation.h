@@ -1,5 +1,5 @@
-#ifndef ORVA_API_ACTIVATION_H_
-#define ORVA_API_ACTIVATION_H_
+#ifndef ORVA_TOOLKIT_ACTIVATION_H_
+#define ORVA_TOOLKIT_ACTIVATION_H_
 
 #include <json/json.h>
 
@@ -52,4 +52,4 @@ void closePluginHandle(OLIBPLUGIN_HANDLE* handle);
 void answerInstallRequest(ActivationSequence sequence, int code,
                           ORVA::APIResponse* response, const char* sourceFile);
 
-#endif  // ORVA_API_ACTIVATION_H_
+#endif  // ORVA_TOOLKIT_ACTIVATION_H_

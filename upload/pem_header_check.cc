@@ -6,7 +6,7 @@
 #include "common/log.h"
 #include "common/raii.h"
 #include "platform/olib/olib_unicode.h"
-#include "upload/uploadsslca.h"
+#include "upload/sslca_form_handler.h"
 
 namespace {
 

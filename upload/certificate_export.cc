@@ -5,13 +5,13 @@
 #include <string>
 #include <vector>
 
-#include "api/generation_area.h"
 #include "common/log.h"
 #include "common/shell_command.h"
 #include "common/store_paths.h"
 #include "platform/olib/orva_root.h"
 #include "platform/webapi/api_download.h"
-#include "upload/uploadsslca.h"
+#include "toolkit/generation_area.h"
+#include "upload/sslca_form_handler.h"
 
 namespace {
 
