@@ -39,19 +39,19 @@ CallOutcome HostFailure(int status) {
   return outcome;
 }
 
-const ORVA::APIEntry* FindApiRow(const ORVA::APIEntry* table,
+const ORVA::APIEntry* FindApiRow(const ORVA::APITable& table,
                                  const std::string& api,
                                  const std::string& method, int version) {
-  for (int i = 0; table != nullptr && i < kModuleApiCount; ++i) {
-    if (api == table[i].api && method == table[i].method &&
-        version == table[i].version) {
-      return &table[i];
+  for (int i = 0; table.rows != nullptr && i < table.count; ++i) {
+    const ORVA::APIEntry& row = table.rows[i];
+    if (api == row.api && method == row.method && version == row.version) {
+      return &row;
     }
   }
   return nullptr;
 }
 
-CallOutcome CallApi(const ORVA::APIEntry* table, const std::string& api,
+CallOutcome CallApi(const ORVA::APITable& table, const std::string& api,
                     const std::string& method, int version,
                     const Json::Value& params) {
   const ORVA::APIEntry* row = FindApiRow(table, api, method, version);

@@ -20,23 +20,20 @@ struct CallOutcome {
   bool httpd_restart = false;    // the handler asked for a web server restart
 };
 
-// Number of rows the certificate module's table holds.
-inline constexpr int kModuleApiCount = 7;
-
 // True for a parameter name that only the host may set ("..._tmp"): these
 // name files on the device.
 bool IsHostOnlyParameter(const std::string& name);
 
-// The row of `table` (kModuleApiCount rows, owned by the module) that
-// serves api, version and method, or null when none does.
-const ORVA::APIEntry* FindApiRow(const ORVA::APIEntry* table,
+// The row of `table` that serves api, version and method, or null when none
+// does.
+const ORVA::APIEntry* FindApiRow(const ORVA::APITable& table,
                                  const std::string& api,
                                  const std::string& method, int version);
 
-// Calls the row of `table` (kModuleApiCount rows) matching api, version and
-// method with `params` (a JSON object of text values). Unknown rows answer
-// 404; a handler that throws or ends without any answer answers 500.
-CallOutcome CallApi(const ORVA::APIEntry* table, const std::string& api,
+// Calls the row of `table` matching api, version and method with `params`
+// (a JSON object of text values). Unknown rows answer 404; a handler that
+// throws or ends without any answer answers 500.
+CallOutcome CallApi(const ORVA::APITable& table, const std::string& api,
                     const std::string& method, int version,
                     const Json::Value& params);
 

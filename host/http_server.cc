@@ -22,7 +22,7 @@ constexpr char kWebapiPath[] = "/webapi";
 
 }  // namespace
 
-WebapiService::WebapiService(std::vector<const ORVA::APIEntry*> tables,
+WebapiService::WebapiService(std::vector<ORVA::APITable> tables,
                              AccessToken token, StaticFiles web,
                              std::function<void()> restart, CallOrder* order)
     : tables_(std::move(tables)),
@@ -108,7 +108,7 @@ void WebapiService::ServeWebapi(const httplib::Request& request,
 }
 
 CallOutcome WebapiService::Dispatch(const WebapiCall& call) {
-  for (const ORVA::APIEntry* table : tables_) {
+  for (const ORVA::APITable& table : tables_) {
     if (FindApiRow(table, call.api, call.method, call.version) == nullptr) continue;
     CallOrder::Turn turn(order_, call.api, call.method);
     return CallApi(table, call.api, call.method, call.version, call.params);

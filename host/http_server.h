@@ -33,7 +33,7 @@ class WebapiService {
   // the answer to a call whose handler asked for a web server restart has
   // been sent. Calls take their turns in `order`, which must outlive this
   // object.
-  WebapiService(std::vector<const ORVA::APIEntry*> tables, AccessToken token,
+  WebapiService(std::vector<ORVA::APITable> tables, AccessToken token,
                 StaticFiles web, std::function<void()> restart, CallOrder* order);
 
   WebapiService(const WebapiService&) = delete;
@@ -49,7 +49,7 @@ class WebapiService {
   void ServeWebapi(const httplib::Request& request, httplib::Response* response);
   CallOutcome Dispatch(const WebapiCall& call);
 
-  const std::vector<const ORVA::APIEntry*> tables_;
+  const std::vector<ORVA::APITable> tables_;
   const AccessToken token_;
   const StaticFiles web_;
   const std::function<void()> restart_;

@@ -20,7 +20,14 @@ bool ModuleLoader::Load(const std::string& path, std::string* error) {
     *error = path + " has no GetAPITable";
     return false;
   }
-  table_ = get_table();
+  auto get_size = reinterpret_cast<GetAPITableSizeFunction>(
+      dlsym(library_, "GetAPITableSize"));
+  int count = get_size != nullptr ? get_size() : kDefaultApiTableSize;
+  if (count < 1) {
+    *error = path + " has an empty table";
+    return false;
+  }
+  table_ = {get_table(), count};
   return true;
 }
 

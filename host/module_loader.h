@@ -15,18 +15,18 @@ class ModuleLoader {
   ModuleLoader& operator=(const ModuleLoader&) = delete;
 
   // Loads the module at `path`. Returns false with a message in *error when
-  // it cannot be loaded or lacks GetAPITable.
+  // it cannot be loaded, lacks GetAPITable or gives a size below one.
   bool Load(const std::string& path, std::string* error);
 
-  // The module's table (rows owned by the module), or null before Load.
-  const ORVA::APIEntry* table() const { return table_; }
+  // The module's table (rows owned by the module); empty before Load.
+  const ORVA::APITable& table() const { return table_; }
 
   // The certificate module installed beside this executable.
   static std::string DefaultModulePath();
 
  private:
   void* library_ = nullptr;
-  const ORVA::APIEntry* table_ = nullptr;
+  ORVA::APITable table_;
 };
 
 #endif  // ORVA_HOST_MODULE_LOADER_H_

@@ -47,7 +47,7 @@ int RunServe(const ServeOptions& options) {
   std::vector<std::unique_ptr<ModuleLoader>> modules;
   std::vector<std::string> paths = {ModuleLoader::DefaultModulePath()};
   paths.insert(paths.end(), options.modules.begin(), options.modules.end());
-  std::vector<const ORVA::APIEntry*> tables;
+  std::vector<ORVA::APITable> tables;
   for (const std::string& path : paths) {
     modules.push_back(std::make_unique<ModuleLoader>());
     if (!modules.back()->Load(path, &error)) return Fail(error);

@@ -11,9 +11,8 @@ struct ServeOptions {
   ListenAddress http{"127.0.0.1", 8080};
   ListenAddress https{"127.0.0.1", 8443};
   std::string web;                           // "": StaticFiles::DefaultDirectory()
-  // Web-API modules loaded after the certificate module, each with a table
-  // of kModuleApiCount rows; a method is served by the first module that
-  // has it.
+  // Web-API modules loaded after the certificate module; a method is served
+  // by the first module that has it.
   std::vector<std::string> modules;
 };
 
