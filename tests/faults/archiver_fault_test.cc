@@ -15,10 +15,10 @@ TEST(ArchiverFaults, Missing7zSendsNothingAndKeepsEveryStoreFile) {
   const StoreState before = ReadStore(root);
   for (const char* set : {"archive", "csr_set", "signed_set"}) {
     SCOPED_TRACE(set);
-    ORVA::APIResponse response;
-    EXPECT_FALSE(CallExport(set, &response));
-    EXPECT_TRUE(response.output_enabled());
-    EXPECT_EQ(ORVA::APIResponse::Outcome::kNone, response.outcome());
+    MethodAnswer answer = CallExport(set);
+    EXPECT_FALSE(answer.download.has_body);
+    EXPECT_TRUE(answer.response.output_enabled());
+    EXPECT_EQ(ORVA::APIResponse::Outcome::kNone, answer.response.outcome());
     EXPECT_FALSE(FileExists(root.Path("/usr/orva/etc/ssl/.gen/archive.zip")));
     EXPECT_EQ(CertificateFiles(before), CertificateFiles(ReadStore(root)))
         << "a set that was not sent is not handed out";

@@ -9,47 +9,13 @@
 #include <vector>
 
 #include "platform/webapi/api_response.h"
+#include "tests/support/method_calls.h"
+#include "tests/support/store_state.h"
 #include "tests/support/test_support.h"
 
 // Fault injection around the certificate store: a failing openssl, a full
 // disk, folders that cannot be written, and the checks that prove what the
 // store holds afterwards.
-
-inline constexpr char kStore[] = "/usr/orva/etc/ssl";
-
-// One file of the store: its content and mode.
-struct StoreFile {
-  std::string content;
-  mode_t mode;
-};
-// Every regular file under the store, by its path relative to the store
-// (for example "ssl.key/server.key"). The disk filler is left out.
-using StoreState = std::map<std::string, StoreFile>;
-
-StoreState ReadStore(const TempDeviceRoot& root);
-// Empties the store folder and writes `state` back, modes included.
-void RestoreStore(const TempDeviceRoot& root, const StoreState& state);
-
-// A complete store before a fault: a local CA (key, request, certificate),
-// a server pair it signed with an intermediate file, a pending request pair
-// and a signed certificate waiting in the generation area, and the serial
-// file. Outside the store, in "/outside" of the device root: a request to
-// sign (request.csr, request.key) and a server set the CA signed, to import
-// (server.crt, server.key, server-ca.crt). Keys have 1024 bits to keep the tests quick. Fails the test (fatal)
-// when a fixture cannot be made.
-void InstallOldStore(const TempDeviceRoot& root);
-
-// After a fault: no temporary or work file (".tmp" in the name, or a
-// hidden file other than the serial file) is left, and every store file is
-// either as in `before` or a complete file of its kind (keys, certificates
-// and requests decode whole, the serial is hex digits, configuration files
-// end with a line end). The live server pair, the CA pair and the pending
-// pair each match where both files exist. Reports failures with EXPECT.
-void ExpectStoreWhole(const TempDeviceRoot& root, const StoreState& before);
-
-// The files that hold keys, certificates and requests, with their content
-// only, to prove they did not change.
-std::map<std::string, std::string> CertificateFiles(const StoreState& state);
 
 // Replaces the device's openssl with a script that counts its runs in a file
 // of the device root and passes everything else to the machine's tool.
@@ -86,20 +52,6 @@ class TestMounts {
  private:
   std::vector<std::string> mounted_;
 };
-
-// The store's writers and readers as the host calls them.
-ORVA::APIResponse CallCreateCsr();
-ORVA::APIResponse CallRenew();
-// Signs the request file at the real path `csrPath`.
-ORVA::APIResponse CallSign(const std::string& csrPath);
-ORVA::APIResponse CallCreateCrt();
-ORVA::APIResponse CallList();
-// Imports the uploads at the real paths given.
-ORVA::APIResponse CallImport(const std::string& certPath, const std::string& keyPath,
-                             const std::string& interPath);
-// Exports `set`; stores the answer in *response and returns whether a
-// download body was sent.
-bool CallExport(const char* set, ORVA::APIResponse* response);
 
 // A method that writes the store, by name, for tables of cases.
 struct StoreWriter {

@@ -51,8 +51,8 @@ TEST_F(FullDisk, EveryWriterFillingTheDiskAtAnyToolRunLeavesWholeFiles) {
       if (response.outcome() != Outcome::kSuccess) {
         EXPECT_EQ(writer.write_error, response.error_code());
       }
-      ExpectStoreWhole(root_, before_);
       FreeDisk(root_);
+      ExpectStoreWhole(root_, before_);
       RestoreStore(root_, before_);
     }
   }
@@ -63,9 +63,9 @@ TEST_F(FullDisk, FullBeforeTheRequestFailsEveryWriterAndKeepsEveryCertificateFil
     SCOPED_TRACE(writer.name);
     InstallFaultyOpenssl(root_, ToolFault{0, 1});
     EXPECT_EQ(writer.write_error, writer.call(root_).error_code());
+    FreeDisk(root_);
     ExpectStoreWhole(root_, before_);
     EXPECT_EQ(CertificateFiles(before_), CertificateFiles(ReadStore(root_)));
-    FreeDisk(root_);
     RestoreStore(root_, before_);
   }
 }
@@ -92,8 +92,8 @@ TEST_F(FullDisk, ImportRunningOutOfRoomAtAnyCopyKeepsTheOldSetAndNoCopy) {
           << log.Text();
       EXPECT_EQ(CertificateFiles(before_), CertificateFiles(ReadStore(root_)));
     }
-    ExpectStoreWhole(root_, before_);
     FreeDisk(root_);
+    ExpectStoreWhole(root_, before_);
     RestoreStore(root_, before_);
   }
 }
@@ -102,8 +102,7 @@ TEST_F(FullDisk, ExportOnAFullDiskSendsNothingAndLeavesNoArchive) {
   ASSERT_NO_FATAL_FAILURE(FillDisk(root_));
   for (const char* set : {"archive", "csr_set"}) {
     SCOPED_TRACE(set);
-    ORVA::APIResponse response;
-    EXPECT_FALSE(CallExport(set, &response));
+    EXPECT_FALSE(CallExport(set).download.has_body);
     EXPECT_FALSE(FileExists(root_.Path(std::string(kStore) + "/.gen/archive.zip")))
         << "no cut archive is left";
     EXPECT_EQ(CertificateFiles(before_), CertificateFiles(ReadStore(root_)));

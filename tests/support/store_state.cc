@@ -1,0 +1,173 @@
+#include "tests/support/store_state.h"
+
+#include <sys/stat.h>
+
+#include <openssl/pem.h>
+#include <openssl/x509.h>
+
+#include <filesystem>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "common/pem_password.h"
+#include "common/raii.h"
+#include "tests/support/certificates.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+bool EndsWith(const std::string& text, const std::string& end) {
+  return text.size() >= end.size() &&
+         text.compare(text.size() - end.size(), end.size(), end) == 0;
+}
+
+bool IsWorkFile(const std::string& path) {
+  const std::string name = fs::path(path).filename();
+  return name.find(".tmp") != std::string::npos ||
+         (name[0] == '.' && name != ".mkcert.serial" && name != ".gen");
+}
+
+BioPtr MemoryBio(const std::string& content) {
+  return BioPtr(BIO_new_mem_buf(content.data(), static_cast<int>(content.size())));
+}
+
+EvpPkeyPtr ReadKey(BIO* bio) {
+  return EvpPkeyPtr(PEM_read_bio_PrivateKey(bio, nullptr, RefusePemPassword, nullptr));
+}
+X509Ptr ReadCertificate(BIO* bio) {
+  return X509Ptr(PEM_read_bio_X509(bio, nullptr, RefusePemPassword, nullptr));
+}
+using RequestPtr = std::unique_ptr<X509_REQ, decltype(&X509_REQ_free)>;
+RequestPtr ReadRequest(BIO* bio) {
+  return RequestPtr(PEM_read_bio_X509_REQ(bio, nullptr, RefusePemPassword, nullptr),
+                    X509_REQ_free);
+}
+
+// True when every PEM block of `content` decodes with `read`, and there is
+// one block, or at least one when `chain`: a cut file fails to decode.
+template <typename Read>
+bool DecodesWhole(const std::string& content, Read read, bool chain = false) {
+  size_t blocks = 0;
+  for (size_t at = content.find("-----BEGIN"); at != std::string::npos;
+       at = content.find("-----BEGIN", at + 1)) {
+    ++blocks;
+  }
+  BioPtr bio = MemoryBio(content);
+  size_t decoded = 0;
+  while (read(bio.get())) ++decoded;
+  return decoded == blocks && (chain ? blocks > 0 : blocks == 1);
+}
+
+bool IsWholeFileOfItsKind(const std::string& name, const std::string& content) {
+  if (EndsWith(name, ".key")) return DecodesWhole(content, ReadKey);
+  if (EndsWith(name, ".crt")) return DecodesWhole(content, ReadCertificate, true);
+  if (EndsWith(name, ".csr")) return DecodesWhole(content, ReadRequest);
+  if (name == ".mkcert.serial") {
+    const std::string digits = content.substr(0, content.find_last_not_of('\n') + 1);
+    return !digits.empty() && digits.find_first_not_of("0123456789ABCDEFabcdef") == std::string::npos;
+  }
+  if (name.rfind("cfg.d/", 0) == 0) return !content.empty() && content.back() == '\n';
+  if (name == ".gen/archive.zip") return content.rfind("PK", 0) == 0;
+  return false;
+}
+
+void ExpectPair(const StoreState& state, const std::string& key, const std::string& other) {
+  if (state.count(key) == 0 || state.count(other) == 0) return;
+  BioPtr keyBio = MemoryBio(state.at(key).content);
+  BioPtr otherBio = MemoryBio(state.at(other).content);
+  EvpPkeyPtr privateKey = ReadKey(keyBio.get());
+  bool matches = false;
+  if (EndsWith(other, ".csr")) {
+    RequestPtr request = ReadRequest(otherBio.get());
+    matches = privateKey && request && X509_REQ_check_private_key(request.get(), privateKey.get()) == 1;
+  } else {
+    X509Ptr certificate = ReadCertificate(otherBio.get());
+    matches = privateKey && certificate && X509_check_private_key(certificate.get(), privateKey.get()) == 1;
+  }
+  EXPECT_TRUE(matches) << key << " does not belong to " << other;
+}
+
+}  // namespace
+
+StoreState ReadStore(const TempDeviceRoot& root) {
+  const fs::path store = root.Path(kStore);
+  StoreState state;
+  std::error_code error;
+  for (fs::recursive_directory_iterator entry(store, error), end; !error && entry != end;
+       entry.increment(error)) {
+    if (entry->is_directory()) continue;
+    const fs::perms mode = entry->symlink_status().permissions();
+    state[fs::relative(entry->path(), store)] = {ReadFile(entry->path()),
+                                                 static_cast<mode_t>(mode)};
+  }
+  return state;
+}
+
+void RestoreStore(const TempDeviceRoot& root, const StoreState& state) {
+  // The store may be a mount point, so it stays and only its entries go.
+  std::vector<fs::path> entries;
+  for (const fs::directory_entry& entry : fs::directory_iterator(root.Path(kStore))) {
+    entries.push_back(entry.path());
+  }
+  for (const fs::path& entry : entries) fs::remove_all(entry);
+  for (const auto& [name, file] : state) {
+    root.WriteFile(std::string(kStore) + "/" + name, file.content, file.mode);
+  }
+}
+
+void InstallOldStore(const TempDeviceRoot& root) {
+  const std::string ssl = root.Path(kStore);
+  ASSERT_TRUE(MakeSelfSignedCa(ssl + "/ssl.key/ca.key", ssl + "/ssl.crt/ca.crt",
+                               "/CN=Old Root", 1024));
+  MakeDirs(ssl + "/ssl.csr");
+  ASSERT_TRUE(RunForTest("openssl req -new -key '" + ssl + "/ssl.key/ca.key' -subj '/CN=Old Root' -out '" +
+                         ssl + "/ssl.csr/ca.csr'"));
+  ASSERT_TRUE(MakeSignedCertificate(ssl + "/ssl.key/ca.key", ssl + "/ssl.crt/ca.crt",
+                                    ssl + "/ssl.key/server.key", ssl + "/ssl.crt/server.crt",
+                                    "/C=TW/O=Old Works/CN=old.local", 1024));
+  const std::string caCertificate = ReadFile(ssl + "/ssl.crt/ca.crt");
+  root.WriteFile(std::string(kStore) + "/ssl.intercrt/server-ca.crt", caCertificate);
+  ASSERT_TRUE(MakeRequest(ssl + "/.gen/server.key", ssl + "/.gen/server.csr",
+                          "/CN=pending.local", 1024));
+  root.WriteFile(std::string(kStore) + "/.gen/server.crt",
+                 ReadFile(ssl + "/ssl.crt/server.crt"), 0400);
+  root.WriteFile(std::string(kStore) + "/.mkcert.serial", "5F3A11");
+  root.WriteFile(std::string(kStore) + "/cfg.d/ca.cfg", "[ req ]\n");
+  for (const char* key : {"/ssl.key/ca.key", "/ssl.key/server.key", "/.gen/server.key"}) {
+    chmod((ssl + key).c_str(), 0400);
+  }
+  ASSERT_TRUE(MakeRequest(root.Path("/outside/request.key"), root.Path("/outside/request.csr"),
+                          "/CN=client.local", 1024));
+  ASSERT_TRUE(MakeSignedCertificate(ssl + "/ssl.key/ca.key", ssl + "/ssl.crt/ca.crt",
+                                    root.Path("/outside/server.key"),
+                                    root.Path("/outside/server.crt"), "/CN=imported.local", 1024));
+  root.WriteFile("/outside/server-ca.crt", caCertificate);
+}
+
+void ExpectStoreWhole(const TempDeviceRoot& root, const StoreState& before) {
+  const StoreState now = ReadStore(root);
+  for (const auto& [name, file] : now) {
+    SCOPED_TRACE(name);
+    EXPECT_FALSE(IsWorkFile(name)) << "a file in progress was left behind";
+    auto old = before.find(name);
+    if (old != before.end() && old->second.content == file.content) continue;
+    EXPECT_TRUE(IsWholeFileOfItsKind(name, file.content))
+        << "neither the old file nor a whole new one (" << file.content.size() << " bytes)";
+  }
+  ExpectPair(now, "ssl.key/server.key", "ssl.crt/server.crt");
+  ExpectPair(now, "ssl.key/ca.key", "ssl.crt/ca.crt");
+  ExpectPair(now, "ssl.key/ca.key", "ssl.csr/ca.csr");
+  ExpectPair(now, ".gen/server.key", ".gen/server.csr");
+}
+
+std::map<std::string, std::string> CertificateFiles(const StoreState& state) {
+  std::map<std::string, std::string> files;
+  for (const auto& [name, file] : state) {
+    if (EndsWith(name, ".key") || EndsWith(name, ".crt") || EndsWith(name, ".csr")) {
+      files[name] = file.content;
+    }
+  }
+  return files;
+}

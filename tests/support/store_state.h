@@ -1,0 +1,50 @@
+#ifndef ORVA_TESTS_SUPPORT_STORE_STATE_H_
+#define ORVA_TESTS_SUPPORT_STORE_STATE_H_
+
+#include <sys/types.h>
+
+#include <map>
+#include <string>
+
+#include "tests/support/test_support.h"
+
+// The certificate store as tests see it: a snapshot of its files, a full
+// store to start from, and the proof that a store is whole after a call.
+
+inline constexpr char kStore[] = "/usr/orva/etc/ssl";
+
+struct StoreFile {
+  std::string content;
+  mode_t mode;
+};
+// Every file under the store by its path relative to the store (for
+// example "ssl.key/server.key").
+using StoreState = std::map<std::string, StoreFile>;
+
+StoreState ReadStore(const TempDeviceRoot& root);
+// Empties the store folder and writes `state` back, modes included.
+void RestoreStore(const TempDeviceRoot& root, const StoreState& state);
+
+// A full store: a local CA (key, request, certificate), a server pair it
+// signed with an intermediate file, a pending request pair and a signed
+// certificate in the generation area, a configuration file and the serial.
+// Outside the store, in "/outside" of the device root: a request to sign
+// (request.csr, request.key) and a server set the CA signed, to import
+// (server.crt, server.key, server-ca.crt). 1024-bit keys keep it quick.
+// Fails the test (fatal) when a fixture cannot be made.
+void InstallOldStore(const TempDeviceRoot& root);
+
+// After a call: no file in progress (".tmp" in the name, or a hidden file
+// other than the serial and the generation area) is left; every store file is as in `before` or a whole
+// file of its kind (keys, certificates and requests decode whole, the
+// serial is hex digits, configuration files end with a line end, an
+// archive starts like a ZIP file); and the server pair, the CA's key with
+// its certificate and request, and the pending pair each match where both
+// files exist. Reports failures with EXPECT.
+void ExpectStoreWhole(const TempDeviceRoot& root, const StoreState& before);
+
+// The keys, certificates and requests of `state`, content only, to prove
+// that a failed call changed none of them.
+std::map<std::string, std::string> CertificateFiles(const StoreState& state);
+
+#endif  // ORVA_TESTS_SUPPORT_STORE_STATE_H_
