@@ -9,11 +9,9 @@
 
 namespace {
 
-enum RuleType { kTextRule = 4, kArrayRule = 8, kNumberRule = 14 };
-
 struct Rule {
   const char* name;
-  RuleType type;
+  ParameterType type;
   bool necessary;
 };
 
@@ -54,14 +52,14 @@ extern "C" const ORVA::APIEntry* GetAPITable() { return gTable; }
 void doCertificateList_v1(ORVA::APIRequest* request,
                           ORVA::APIResponse* response) {
   CheckThen(request, response,
-            {{"type", kTextRule, false}, {"additional", kArrayRule, false}},
+            {{"type", kParameterText, false}, {"additional", kParameterJsonArray, false}},
             handleListAction);
 }
 
 void doCertificateExport_v1(ORVA::APIRequest* request,
                             ORVA::APIResponse* response) {
   SSLCAFormHandler handler;
-  CheckThen(request, response, {{"file", kTextRule, true}},
+  CheckThen(request, response, {{"file", kParameterText, true}},
             [&handler](ORVA::APIRequest* checked, ORVA::APIResponse* answer) {
               handler.DownloadAction(checked, answer);
             });
@@ -71,9 +69,9 @@ void doCertificateImport_v1(ORVA::APIRequest* request,
                             ORVA::APIResponse* response) {
   SSLCAFormHandler handler;
   CheckThen(request, response,
-            {{"cert_tmp", kTextRule, true},
-             {"key_tmp", kTextRule, true},
-             {"inter_cert_tmp", kTextRule, false}},
+            {{"cert_tmp", kParameterText, true},
+             {"key_tmp", kParameterText, true},
+             {"inter_cert_tmp", kParameterText, false}},
             [&handler](ORVA::APIRequest* checked, ORVA::APIResponse* answer) {
               handler.ProcessJsonReq(checked, answer);
             });
@@ -82,13 +80,13 @@ void doCertificateImport_v1(ORVA::APIRequest* request,
 void doCertificateCreateCSR_v1(ORVA::APIRequest* request,
                                ORVA::APIResponse* response) {
   CheckThen(request, response,
-            {{"country", kTextRule, true},
-             {"state", kTextRule, true},
-             {"city", kTextRule, true},
-             {"organization", kTextRule, true},
-             {"department", kTextRule, true},
-             {"common_name", kTextRule, true},
-             {"email", kTextRule, true}},
+            {{"country", kParameterText, true},
+             {"state", kParameterText, true},
+             {"city", kParameterText, true},
+             {"organization", kParameterText, true},
+             {"department", kParameterText, true},
+             {"common_name", kParameterText, true},
+             {"email", kParameterText, true}},
             handleCSRAction);
 }
 
@@ -100,29 +98,29 @@ void doCertificateRenew_v1(ORVA::APIRequest* request,
 void doCertificateSign_v1(ORVA::APIRequest* request,
                           ORVA::APIResponse* response) {
   CheckThen(request, response,
-            {{"alias", kTextRule, false},
-             {"days", kNumberRule, true},
-             {"csr", kTextRule, true},
-             {"csr_tmp", kTextRule, true}},
+            {{"alias", kParameterText, false},
+             {"days", kParameterWholeNumber, true},
+             {"csr", kParameterText, true},
+             {"csr_tmp", kParameterText, true}},
             handleSignCSRAction);
 }
 
 void doCertificateCreateCRT_v1(ORVA::APIRequest* request,
                                ORVA::APIResponse* response) {
   CheckThen(request, response,
-            {{"ca_country", kTextRule, true},
-             {"ca_state", kTextRule, true},
-             {"ca_city", kTextRule, true},
-             {"ca_organization", kTextRule, true},
-             {"ca_department", kTextRule, true},
-             {"ca_common_name", kTextRule, true},
-             {"ca_email", kTextRule, true},
-             {"country", kTextRule, true},
-             {"state", kTextRule, true},
-             {"city", kTextRule, true},
-             {"organization", kTextRule, true},
-             {"department", kTextRule, true},
-             {"common_name", kTextRule, true},
-             {"email", kTextRule, true}},
+            {{"ca_country", kParameterText, true},
+             {"ca_state", kParameterText, true},
+             {"ca_city", kParameterText, true},
+             {"ca_organization", kParameterText, true},
+             {"ca_department", kParameterText, true},
+             {"ca_common_name", kParameterText, true},
+             {"ca_email", kParameterText, true},
+             {"country", kParameterText, true},
+             {"state", kParameterText, true},
+             {"city", kParameterText, true},
+             {"organization", kParameterText, true},
+             {"department", kParameterText, true},
+             {"common_name", kParameterText, true},
+             {"email", kParameterText, true}},
             handleCRTAction);
 }

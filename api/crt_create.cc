@@ -70,8 +70,10 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
   // The live pair is made under work names and installed only once proved:
   // a failure on the way leaves the running key and certificate together.
   StoreFileSet server_pair;
-  const std::string server_key = server_pair.Add(OrvaPath(kServerKeyPath));
-  const std::string server_crt = server_pair.Add(OrvaPath(kServerCrtPath));
+  const std::string server_key =
+      server_pair.Add(OrvaPath(kServerKeyPath), StoreContent::kPrivateKey);
+  const std::string server_crt =
+      server_pair.Add(OrvaPath(kServerCrtPath), StoreContent::kCertificate);
   if (genKey(server_key.c_str(), static_cast<unsigned int>(key_length)) == -1) {
     ORVA_LOG("Generate server key failed");
     return kErrFailed;

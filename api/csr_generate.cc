@@ -1,6 +1,5 @@
 #include "api/csr_generate.h"
 
-#include <cstdio>
 #include <string>
 
 #include "common/log.h"
@@ -8,20 +7,7 @@
 #include "platform/olib/orva_root.h"
 #include "toolkit/generation_area.h"
 #include "toolkit/mkcert.h"
-
-namespace {
-
-// Work files of one generation; removed when they were not installed.
-struct PendingPair {
-  std::string key = GenerationWorkPath(".new-server.key");
-  std::string request = GenerationWorkPath(".new-server.csr");
-  ~PendingPair() {
-    std::remove(key.c_str());      // Ignoring errors: absent once installed.
-    std::remove(request.c_str());
-  }
-};
-
-}  // namespace
+#include "toolkit/store_file.h"
 
 int generateCSR(int keyLength, CSR_ARGUMENT& record) {
   if (!MakeGenerationArea()) {
@@ -34,18 +20,21 @@ int generateCSR(int keyLength, CSR_ARGUMENT& record) {
     ORVA_LOG("genCsr Error path: %s", kGenCsrPath);
     return 0;
   }
-  PendingPair pending;
-  if (genKey(pending.key.c_str(), static_cast<unsigned int>(keyLength)) == -1) {
+  StoreFileSet pending;
+  const std::string request =
+      pending.Add(OrvaPath(kGenCsrPath), StoreContent::kRequest);
+  const std::string key =
+      pending.Add(OrvaPath(kGenKeyPath), StoreContent::kPrivateKey);
+  if (genKey(key.c_str(), static_cast<unsigned int>(keyLength)) == -1) {
     ORVA_LOG("genKey Error path: %s", kGenKeyPath);
     return 0;
   }
-  if (genCsr(OrvaPath(kCaCfgPath).c_str(), pending.key.c_str(),
-             pending.request.c_str(), &record) != 0) {
+  if (genCsr(OrvaPath(kCaCfgPath).c_str(), key.c_str(), request.c_str(),
+             &record) != 0) {
     ORVA_LOG("genCsr Error path: %s", kGenCsrPath);
     return 0;
   }
-  if (std::rename(pending.request.c_str(), OrvaPath(kGenCsrPath).c_str()) != 0 ||
-      std::rename(pending.key.c_str(), OrvaPath(kGenKeyPath).c_str()) != 0) {
+  if (pending.Install() != 0) {
     ORVA_LOG("genCsr Error path: %s", kGenCsrPath);
     return 0;
   }

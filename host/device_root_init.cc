@@ -1,33 +1,22 @@
 #include "host/device_root_init.h"
 
-#include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
 #include <fstream>
-#include <vector>
+
+#include "common/file_util.h"
 
 namespace {
 
-bool MakeDirectories(const std::string& path, mode_t mode, std::string* error) {
-  std::string partial;
-  std::string::size_type start = 0;
-  while (start != std::string::npos) {
-    std::string::size_type slash = path.find('/', start + 1);
-    partial = path.substr(0, slash);
-    start = slash;
-    if (partial.empty()) continue;
-    if (mkdir(partial.c_str(), mode) != 0 && errno != EEXIST) {
-      *error = "cannot make " + partial + ": " + std::strerror(errno);
-      return false;
-    }
-  }
-  return true;
+bool MakeFolder(const std::string& path, std::string* error) {
+  if (MakeDirectories(path)) return true;
+  *error = "cannot make " + path;
+  return false;
 }
 
 // Writes `content` to a new file `path` with `mode`; an existing file is
@@ -40,8 +29,7 @@ bool WriteNewFile(const std::string& path, const std::string& content,
     *error = "cannot write " + path + ": " + std::strerror(errno);
     return false;
   }
-  bool written = write(fd, content.data(), content.size()) ==
-                 static_cast<ssize_t>(content.size());
+  bool written = WriteAll(fd, content.data(), content.size());
   if (close(fd) != 0) written = false;
   if (!written) {
     unlink(path.c_str());
@@ -93,33 +81,6 @@ std::string RandomToken() {
   return token;
 }
 
-// The address of the first non-loopback interface as 12 upper-case hex
-// digits, or "" when there is none.
-std::string FirstMacAddress() {
-  std::vector<std::string> names;
-  if (DIR* dir = opendir("/sys/class/net")) {
-    while (struct dirent* entry = readdir(dir)) {
-      if (entry->d_name[0] != '.' && std::strcmp(entry->d_name, "lo") != 0) {
-        names.push_back(entry->d_name);
-      }
-    }
-    closedir(dir);
-  }
-  std::sort(names.begin(), names.end());
-  for (const std::string& name : names) {
-    std::ifstream file("/sys/class/net/" + name + "/address");
-    std::string address, digits;
-    if (!std::getline(file, address)) continue;
-    for (char c : address) {
-      if (std::isxdigit(static_cast<unsigned char>(c))) {
-        digits += static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
-      }
-    }
-    if (digits.size() == 12 && digits != "000000000000") return digits;
-  }
-  return "";
-}
-
 }  // namespace
 
 bool UseDeviceRoot(const std::string& root, std::string* absolute) {
@@ -142,7 +103,7 @@ bool InitDeviceRoot(const std::string& root, std::string* error) {
       "/proc/sys/kernel",
   };
   for (const char* directory : kDirectories) {
-    if (!MakeDirectories(root + directory, 0755, error)) return false;
+    if (!MakeFolder(root + directory, error)) return false;
   }
   if (!LinkTool(root, "openssl", error) || !LinkTool(root, "7z", error)) {
     return false;
@@ -157,7 +118,7 @@ bool InitDeviceRoot(const std::string& root, std::string* error) {
     return false;
   }
   if (!WriteNewFile(TokenPath(root), token + "\n", 0600, error)) return false;
-  std::string mac = FirstMacAddress();
+  std::string mac = FirstInterfaceMacAddress();
   if (mac.empty()) mac = "020000000001";  // A locally administered address.
   return WriteNewFile(root + "/proc/sys/kernel/orva_mac_address1", mac + "\n",
                       0644, error);

@@ -7,6 +7,8 @@
 
 #include <cstdlib>
 
+#include "common/file_util.h"
+
 TemporaryUploads::~TemporaryUploads() {
   for (const std::string& path : paths_) {
     unlink(path.c_str());  // Ignoring errors: the handler may have moved it.
@@ -23,18 +25,7 @@ bool TemporaryUploads::Add(const std::string& name, const std::string& content,
                      "/orva-upload-XXXXXX";
   int fd = mkostemp(&path[0], O_CLOEXEC);  // mkostemp makes mode 0600.
   if (fd < 0) return false;
-  const char* data = content.data();
-  size_t left = content.size();
-  bool written = true;
-  while (left > 0) {
-    ssize_t count = write(fd, data, left);
-    if (count <= 0) {
-      written = false;
-      break;
-    }
-    data += count;
-    left -= static_cast<size_t>(count);
-  }
+  bool written = WriteAll(fd, content.data(), content.size());
   if (close(fd) != 0) written = false;
   if (!written) {
     unlink(path.c_str());

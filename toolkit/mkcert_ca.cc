@@ -15,9 +15,10 @@ int genCASet(CSR_ARGUMENT* subject, int bits) {
   // Made under work names and installed only as a proven set: a CA key
   // beside the certificate of another key could sign nothing.
   StoreFileSet set;
-  const std::string request = set.Add(OrvaPath(kCaCsrPath));
-  const std::string certificate = set.Add(OrvaPath(kCaCrtPath));
-  const std::string key = set.Add(OrvaPath(kCaKeyPath));
+  const std::string request = set.Add(OrvaPath(kCaCsrPath), StoreContent::kRequest);
+  const std::string certificate =
+      set.Add(OrvaPath(kCaCrtPath), StoreContent::kCertificate);
+  const std::string key = set.Add(OrvaPath(kCaKeyPath), StoreContent::kPrivateKey);
 
   int result = genKey(key.c_str(), static_cast<unsigned int>(bits));
   if (result != 0) {

@@ -1,11 +1,10 @@
 // Directories and RSA keys.
 
-#include <libgen.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
 #include <string>
 
+#include "common/file_util.h"
 #include "common/log.h"
 #include "common/shell_command.h"
 #include "toolkit/mkcert.h"
@@ -44,16 +43,7 @@ int genDir(const char* path) {
     ORVA_LOG("genDir sanity check failed");
     return -1;
   }
-  std::string copy(path);
-  const char* directory = dirname(&copy[0]);
-  // Every writer comes here, and the directory is nearly always there: the
-  // command (a shell and mkdir, two processes) runs only when there is
-  // something to make, with the same outcome either way.
-  struct stat info;
-  if (stat(directory, &info) == 0 && S_ISDIR(info.st_mode)) return 0;
-  ShellCommand command(RootedCommandSize(kToolkitCommandSize));
-  command.Append("mkdir -p %s", {directory});
-  return RunShellCommand(command) == 0 ? 0 : -1;
+  return MakeDirectories(DirectoryOf(path)) ? 0 : -1;
 }
 
 int genKey(const char* keyPath, unsigned int bits) {
@@ -66,21 +56,22 @@ int genKey(const char* keyPath, unsigned int bits) {
     ORVA_LOG("generate directory failed");
     return -1;
   }
-  PendingStoreFile key(keyPath, StoreContent::kPrivateKey);
-  if (!key.ok()) return -1;
+  StoreFileSet set;
+  const std::string key = set.Add(keyPath, StoreContent::kPrivateKey);
+  if (key.empty()) return -1;
 
   std::string seeds = ExistingSeedFiles();
   ShellCommand command(RootedCommandSize(kToolkitCommandSize));
   if (seeds.empty()) {
     command.Append("%s genrsa -out %s %d >/dev/null 2>&1",
-                   {OpensslTool(), key.temporary(), bits});
+                   {OpensslTool(), key, bits});
   } else {
     command.Append("%s genrsa -rand %s -out %s %d >/dev/null 2>&1",
-                   {OpensslTool(), seeds, key.temporary(), bits});
+                   {OpensslTool(), seeds, key, bits});
   }
   if (!ToolExitedCleanly(RunShellCommand(command))) {
     ORVA_LOG("Error when execute \"%s\"", command.line());
     return -1;
   }
-  return key.Install();
+  return set.Install();
 }

@@ -130,15 +130,16 @@ int genCsr(const char* configPath, const char* keyPath,
   }
   if (modifyCsrCfg(configPath, *subject) != 0) return -1;
 
-  PendingStoreFile request(requestPath, StoreContent::kRequest);
-  if (!request.ok()) return -1;
+  StoreFileSet set;
+  const std::string request = set.Add(requestPath, StoreContent::kRequest);
+  if (request.empty()) return -1;
   ShellCommand command(RootedCommandSize(kToolkitCommandSize));
   command.Append(
       "%s req -config %s -new -sha256 -key %s -out %s >/dev/null 2>&1",
-      {OpensslTool(), configPath, keyPath, request.temporary()});
+      {OpensslTool(), configPath, keyPath, request});
   if (RunShellCommand(command) != 0) {
     ORVA_LOG("Create CSR failed, command[%s]", command.line());
     return -1;
   }
-  return request.Install();
+  return set.Install();
 }

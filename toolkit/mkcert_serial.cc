@@ -1,16 +1,10 @@
 // The serial number file of the local CA.
 
-#include <dirent.h>
-#include <net/if.h>
-
-#include <algorithm>
-#include <cctype>
 #include <cstdio>
-#include <cstdlib>
 #include <ctime>
 #include <string>
-#include <vector>
 
+#include "common/file_util.h"
 #include "common/log.h"
 #include "common/raii.h"
 #include "toolkit/mkcert.h"
@@ -18,8 +12,6 @@
 #include "toolkit/store_file.h"
 
 namespace {
-
-constexpr char kNetworkInterfaces[] = "/sys/class/net";
 
 // The first word of the device's MAC address file, at most 31 characters.
 bool ReadMacAddressFile(std::string* word) {
@@ -31,62 +23,13 @@ bool ReadMacAddressFile(std::string* word) {
   return true;
 }
 
-// The first line of a small system file, without its line end.
-std::string ReadFirstLine(const std::string& path) {
-  FilePtr file(std::fopen(path.c_str(), "r"));
-  char buffer[64] = {0};
-  if (!file || std::fgets(buffer, sizeof(buffer), file.get()) == nullptr) {
-    return "";
-  }
-  std::string line(buffer);
-  while (!line.empty() && std::isspace(static_cast<unsigned char>(line.back()))) {
-    line.pop_back();
-  }
-  return line;
-}
-
-// "aa:bb:..." as upper-case hex digits without colons; empty when the text
-// is not an address or is all zeros.
-std::string AddressDigits(const std::string& address) {
-  std::string digits;
-  bool all_zero = true;
-  for (char c : address) {
-    if (c == ':') continue;
-    if (!std::isxdigit(static_cast<unsigned char>(c))) return "";
-    if (c != '0') all_zero = false;
-    digits += static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
-  }
-  return all_zero ? "" : digits;
-}
-
-// Where the device's MAC address file is missing, the address of the
-// machine's first non-loopback interface (by name) stands in for it.
-bool ReadInterfaceAddress(std::string* word) {
-  DirPtr directory(opendir(kNetworkInterfaces));
-  if (!directory) return false;
-  std::vector<std::string> names;
-  while (struct dirent* entry = readdir(directory.get())) {
-    if (entry->d_name[0] != '.') names.push_back(entry->d_name);
-  }
-  std::sort(names.begin(), names.end());
-  for (const std::string& name : names) {
-    std::string base = std::string(kNetworkInterfaces) + "/" + name;
-    unsigned long flags =
-        std::strtoul(ReadFirstLine(base + "/flags").c_str(), nullptr, 0);
-    if (flags & IFF_LOOPBACK) continue;
-    std::string digits = AddressDigits(ReadFirstLine(base + "/address"));
-    if (digits.empty()) continue;
-    *word = digits.substr(0, 31);
-    return true;
-  }
-  return false;
-}
-
 }  // namespace
 
 int genSerial() {
   std::string mac;
-  if (!ReadMacAddressFile(&mac) && !ReadInterfaceAddress(&mac)) {
+  // Where the device's MAC address file is missing, the machine's first
+  // network interface stands in for it.
+  if (!ReadMacAddressFile(&mac) && (mac = FirstInterfaceMacAddress()).empty()) {
     ORVA_LOG("Open /proc/sys/kernel/orva_mac_address1 failed");
     return -1;
   }

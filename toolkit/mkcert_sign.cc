@@ -79,12 +79,13 @@ int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,
     return -1;
   }
 
-  PendingStoreFile certificate(output, StoreContent::kCertificate);
-  if (!certificate.ok()) return -1;
+  StoreFileSet set;
+  const std::string certificate = set.Add(output, StoreContent::kCertificate);
+  if (certificate.empty()) return -1;
   ShellCommand command(RootedCommandSize(kToolkitCommandSize));
   command.Append("%s x509 -extfile %s -days %d -in %s -req -sha256 -out %s",
                  {OpensslTool(), extFile, days, requestPath,
-                  certificate.temporary()});
+                  certificate});
   if (selfSigned == TRUE) {
     command.Append(" -signkey %s >/dev/null 2>&1", {keyPath});
   } else {
@@ -95,7 +96,7 @@ int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,
     ORVA_LOG("Error when execute \"%s\"", command.line());
     return -1;
   }
-  return certificate.Install();
+  return set.Install();
 }
 
 int genServerCrtHelper(const char* requestPath, const char* caCertPath,

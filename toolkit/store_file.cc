@@ -9,6 +9,7 @@
 #include <cerrno>
 #include <cstdio>
 
+#include "common/file_util.h"
 #include "common/log.h"
 #include "common/pem_password.h"
 #include "common/raii.h"
@@ -16,22 +17,22 @@
 
 namespace {
 
-std::string DirectoryOf(const std::string& path) {
-  std::string::size_type slash = path.rfind('/');
-  if (slash == std::string::npos) return ".";
-  return slash == 0 ? "/" : path.substr(0, slash);
-}
-
-// Flushes a directory, so a rename in it lasts through a power cut.
-void SyncDirectory(const std::string& path) {
-  int fd = open(DirectoryOf(path).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-  if (fd < 0) return;  // Ignoring errors: the rename itself is done.
-  fsync(fd);
-  close(fd);
+mode_t ModeOf(StoreContent content) {
+  switch (content) {
+    case StoreContent::kImportedCertificate:
+    case StoreContent::kText:
+      return 0644;
+    case StoreContent::kPrivateKey:
+    case StoreContent::kRequest:
+    case StoreContent::kCertificate:
+      break;
+  }
+  return 0400;
 }
 
 // True when the file at `path` holds a whole PEM object of `content`.
 bool HoldsWhole(const std::string& path, StoreContent content) {
+  if (content == StoreContent::kText) return true;
   FilePtr file(std::fopen(path.c_str(), "r"));
   if (!file) return false;
   bool whole = false;
@@ -48,91 +49,105 @@ bool HoldsWhole(const std::string& path, StoreContent content) {
       break;
     }
     case StoreContent::kCertificate:
+    case StoreContent::kImportedCertificate:
       whole = X509Ptr(PEM_read_X509(file.get(), nullptr, RefusePemPassword,
                                     nullptr)) != nullptr;
+      break;
+    case StoreContent::kText:
       break;
   }
   ERR_clear_error();  // A failed read is reported by the caller.
   return whole;
 }
 
-bool WriteAll(int fd, const std::string& text) {
-  size_t done = 0;
-  while (done < text.size()) {
-    ssize_t written = write(fd, text.data() + done, text.size() - done);
-    if (written < 0 && errno == EINTR) continue;
-    if (written <= 0) return false;
-    done += static_cast<size_t>(written);
-  }
-  return true;
+// Creates an empty temporary file beside `target`; "" with errno set when
+// it cannot.
+std::string CreateTemporary(const std::string& target) {
+  std::string name = target + ".tmpXXXXXX";
+  int fd = mkostemp(&name[0], O_CLOEXEC);
+  if (fd < 0) return "";
+  close(fd);  // The writer opens the file by its name.
+  return name;
 }
 
 bool SyncFile(const std::string& path) {
   int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
   if (fd < 0) return false;
   bool synced = fsync(fd) == 0;
+  int error = errno;
   close(fd);
+  errno = error;
   return synced;
 }
 
 }  // namespace
 
-PendingStoreFile::PendingStoreFile(const std::string& target,
-                                   StoreContent content)
-    : target_(target), content_(content) {
-  std::string name = target + ".tmpXXXXXX";
-  int fd = mkostemp(&name[0], O_CLOEXEC);
-  if (fd < 0) {
+StoreFileSet::~StoreFileSet() {
+  if (installed_) return;
+  for (const Member& member : members_) {
+    // Ignoring errors: a member renamed before a failure is gone already.
+    if (!member.temporary.empty()) unlink(member.temporary.c_str());
+  }
+}
+
+std::string StoreFileSet::Add(const std::string& target, StoreContent content) {
+  std::string temporary;
+  if (MakeDirectories(DirectoryOf(target))) temporary = CreateTemporary(target);
+  if (temporary.empty()) {
     OLIB_SET_ERROR(errno);
     ORVA_LOG_LASTERR("Create temporary file for %s failed", target.c_str());
-    return;
+    failed_ = true;
   }
-  close(fd);  // The tool opens the file by its name.
-  temporary_ = name;
+  members_.push_back({target, temporary, content});
+  return temporary;
 }
 
-PendingStoreFile::~PendingStoreFile() {
-  if (ok() && !installed_) {
-    unlink(temporary_.c_str());  // Ignoring errors: the target is intact.
+int StoreFileSet::Install() {
+  if (failed_) return -1;
+  for (const Member& member : members_) {
+    if (!HoldsWhole(member.temporary, member.content)) {
+      ORVA_LOG("The tool's output for %s is incomplete", member.target.c_str());
+      return -1;
+    }
+    if (!SyncFile(member.temporary)) {
+      OLIB_SET_ERROR(errno);
+      ORVA_LOG_LASTERR("Flush %s failed", member.temporary.c_str());
+      return -1;
+    }
+    if (chmod(member.temporary.c_str(), ModeOf(member.content)) != 0) {
+      ORVA_LOG("chmod(%s) failed", member.target.c_str());
+      return -1;
+    }
   }
-}
-
-int PendingStoreFile::Install() {
-  if (!ok()) return -1;
-  if (!HoldsWhole(temporary_, content_)) {
-    ORVA_LOG("The tool's output for %s is incomplete", target_.c_str());
-    return -1;
-  }
-  if (!SyncFile(temporary_)) {
-    OLIB_SET_ERROR(errno);
-    ORVA_LOG_LASTERR("Flush %s failed", temporary_.c_str());
-    return -1;
-  }
-  if (chmod(temporary_.c_str(), 0400) != 0) {
-    ORVA_LOG("chmod(%s) failed", target_.c_str());
-    return -1;
-  }
-  if (rename(temporary_.c_str(), target_.c_str()) != 0) {
-    OLIB_SET_ERROR(errno);
-    ORVA_LOG_LASTERR("Rename %s to %s failed", temporary_.c_str(),
-                     target_.c_str());
-    return -1;
+  // Keys go last: until then the old key stays beside the files it matches.
+  for (bool keys : {false, true}) {
+    for (Member& member : members_) {
+      if ((member.content == StoreContent::kPrivateKey) != keys) continue;
+      if (rename(member.temporary.c_str(), member.target.c_str()) != 0) {
+        OLIB_SET_ERROR(errno);
+        ORVA_LOG_LASTERR("Rename %s to %s failed", member.temporary.c_str(),
+                         member.target.c_str());
+        return -1;
+      }
+      member.temporary.clear();
+      SyncDirectory(DirectoryOf(member.target));
+    }
   }
   installed_ = true;
-  SyncDirectory(target_);
   return 0;
 }
 
 int WriteTextFile(const std::string& path, const std::string& text) {
-  std::string temporary = path + ".tmpXXXXXX";
-  int fd = mkostemp(&temporary[0], O_CLOEXEC);
-  if (fd < 0) {
+  std::string temporary = CreateTemporary(path);
+  if (temporary.empty()) {
     OLIB_SET_ERROR(errno);
     return -1;
   }
-  bool written = WriteAll(fd, text) && fchmod(fd, 0644) == 0 && fsync(fd) == 0;
+  int fd = open(temporary.c_str(), O_WRONLY | O_CLOEXEC);
+  bool written = fd >= 0 && WriteAll(fd, text.data(), text.size()) &&
+                 fchmod(fd, ModeOf(StoreContent::kText)) == 0 && fsync(fd) == 0;
   int error = errno;
-  if (close(fd) != 0 && written) {
+  if (fd >= 0 && close(fd) != 0 && written) {
     written = false;
     error = errno;
   }
@@ -145,35 +160,6 @@ int WriteTextFile(const std::string& path, const std::string& text) {
     OLIB_SET_ERROR(error);
     return -2;
   }
-  SyncDirectory(path);
-  return 0;
-}
-
-StoreFileSet::~StoreFileSet() {
-  for (size_t i = installed_; i < members_.size(); ++i) {
-    unlink(members_[i].work.c_str());  // Ignoring errors: may not exist.
-  }
-}
-
-std::string StoreFileSet::Add(const std::string& target) {
-  std::string::size_type slash = target.rfind('/');
-  std::string work = slash == std::string::npos
-                         ? ".new-" + target
-                         : target.substr(0, slash + 1) + ".new-" + target.substr(slash + 1);
-  members_.push_back({target, work});
-  return work;
-}
-
-int StoreFileSet::Install() {
-  for (; installed_ < members_.size(); ++installed_) {
-    const Member& member = members_[installed_];
-    if (rename(member.work.c_str(), member.target.c_str()) != 0) {
-      OLIB_SET_ERROR(errno);
-      ORVA_LOG_LASTERR("Rename %s to %s failed", member.work.c_str(),
-                       member.target.c_str());
-      return -1;
-    }
-    SyncDirectory(member.target);
-  }
+  SyncDirectory(DirectoryOf(path));
   return 0;
 }

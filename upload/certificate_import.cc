@@ -6,17 +6,19 @@
 
 #include "common/api_errors.h"
 #include "common/log.h"
+#include "common/shell_command.h"
 #include "common/store_paths.h"
 #include "platform/olib/olib_file.h"
 #include "platform/olib/orva_root.h"
 #include "toolkit/activation.h"
+#include "toolkit/store_file.h"
 #include "upload/sslca_form_handler.h"
-#include "upload/staged_copy.h"
 
 namespace {
 
-constexpr mode_t kCertificateMode = 0644;
-constexpr mode_t kKeyMode = 0400;
+// Command lines of the import fit in this many bytes, terminating zero
+// included.
+constexpr size_t kImportCommandSize = 8192;
 
 // True when `path` can be opened for reading and names a regular file. The
 // open does not wait, whatever the path names.
@@ -44,22 +46,30 @@ int InstallUploads(const std::string& certPath, const std::string& keyPath,
     }
   }
 
-  StagedCopy certificate, key, intermediate;
-  int code = certificate.Stage(certPath, OrvaPath(kServerCrtPath),
-                               kCertificateMode);
-  if (code == kErrNone) {
-    code = key.Stage(keyPath, OrvaPath(kServerKeyPath), kKeyMode);
+  struct Upload {
+    const std::string* source;
+    const char* target;
+    StoreContent content;
+  };
+  const Upload uploads[] = {
+      {&certPath, kServerCrtPath, StoreContent::kImportedCertificate},
+      {&keyPath, kServerKeyPath, StoreContent::kPrivateKey},
+      {interPath, kInterCrtPath, StoreContent::kImportedCertificate},
+  };
+  StoreFileSet set;
+  for (const Upload& upload : uploads) {
+    if (upload.source == nullptr) continue;
+    const std::string copy = set.Add(OrvaPath(upload.target), upload.content);
+    if (copy.empty()) return kErrStoreWrite;
+    ShellCommand command(kImportCommandSize);
+    command.Append("/bin/cp %s %s", {*upload.source, copy});
+    if (RunShellCommand(command) != 0) {
+      ORVA_LOG("CA copy command failed:%s", command.line());
+      return kErrStoreWrite;
+    }
   }
-  if (code == kErrNone && interPath != nullptr) {
-    code = intermediate.Stage(*interPath, OrvaPath(kInterCrtPath),
-                              kCertificateMode);
-  }
-  if (code != kErrNone) return code;
-
-  code = certificate.Commit();
-  if (code == kErrNone) code = key.Commit();
-  if (code != kErrNone) return code;
-  if (interPath != nullptr) return intermediate.Commit();
+  if (set.Install() != 0) return kErrStoreWrite;
+  if (interPath != nullptr) return kErrNone;
 
   const std::string installed = OrvaPath(kInterCrtPath);
   if (OLIBCFileExist(installed.c_str()) != 0) {

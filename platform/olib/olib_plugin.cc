@@ -1,10 +1,9 @@
 #include "platform/olib/olib_plugin.h"
 
-#include <dirent.h>
 #include <unistd.h>
 
 #include <algorithm>
-#include <memory>
+#include <filesystem>
 #include <new>
 #include <string>
 #include <vector>
@@ -21,10 +20,6 @@ struct OLIBPluginContext {
 
 namespace {
 
-struct DirCloser {
-  void operator()(DIR* dir) const { closedir(dir); }
-};
-
 bool IsPlainEvent(const char* event) {
   if (event == nullptr || *event == '\0') return false;
   for (const char* p = event; *p != '\0'; ++p) {
@@ -36,11 +31,13 @@ bool IsPlainEvent(const char* event) {
 
 std::vector<std::string> ListExecutables(const std::string& directory) {
   std::vector<std::string> found;
-  std::unique_ptr<DIR, DirCloser> dir(opendir(directory.c_str()));
-  if (!dir) return found;
-  while (struct dirent* entry = readdir(dir.get())) {
-    if (!OLIBIsSafeFileName(entry->d_name)) continue;
-    std::string path = directory + "/" + entry->d_name;
+  std::error_code error;
+  // The error_code forms never throw; an unreadable folder lists nothing.
+  for (std::filesystem::directory_iterator entry(directory, error), end;
+       !error && entry != end; entry.increment(error)) {
+    std::string name = entry->path().filename().string();
+    if (!OLIBIsSafeFileName(name.c_str())) continue;
+    std::string path = directory + "/" + name;
     if (access(path.c_str(), X_OK) == 0) found.push_back(path);
   }
   std::sort(found.begin(), found.end());

@@ -8,8 +8,6 @@
 
 namespace {
 
-enum TypeCode { kText = 4, kJsonArray = 8, kWholeNumber = 14 };
-
 bool ParseJsonArray(const std::string& text, Json::Value* array) {
   Json::CharReaderBuilder builder;
   builder["collectComments"] = false;
@@ -51,9 +49,9 @@ bool CheckValue(ORVA::APIRequest* request, const std::string& name,
                 int type) {
   Json::Value value = request->GetParam(name, Json::Value());
   switch (type) {
-    case kText:
+    case kParameterText:
       return value.isString();
-    case kJsonArray: {
+    case kParameterJsonArray: {
       if (value.isArray()) return true;
       Json::Value array;
       if (!value.isString() || !ParseJsonArray(value.asString(), &array)) {
@@ -62,7 +60,7 @@ bool CheckValue(ORVA::APIRequest* request, const std::string& name,
       request->SetParam(name, array);
       return true;
     }
-    case kWholeNumber: {
+    case kParameterWholeNumber: {
       bool is_integer_kind =
           value.type() == Json::intValue || value.type() == Json::uintValue;
       if (is_integer_kind) return value.isInt();

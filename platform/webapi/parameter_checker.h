@@ -5,17 +5,21 @@
 
 #include "platform/webapi/api_request.h"
 
+// The type codes of a rule. Any other code fails the check.
+enum ParameterType {
+  // The value must be a JSON string.
+  kParameterText = 4,
+  // An array, or a string holding one, which is parsed and stored in the
+  // request in its place.
+  kParameterJsonArray = 8,
+  // A whole number fitting a 32-bit signed integer: a JSON integer, or a
+  // string of decimal digits with an optional leading minus sign, which is
+  // converted and stored in its place.
+  kParameterWholeNumber = 14,
+};
+
 // Checks a request's parameters against a rule set
 // {"field": {NAME: {"type": CODE, "necessary": BOOL}}}.
-//
-// Type codes:
-//   4  text: the value must be a JSON string.
-//   8  JSON array: an array, or a string holding one, which is parsed and
-//      stored in the request in its place.
-//   14 whole number fitting a 32-bit signed integer: a JSON integer, or a
-//      string of decimal digits with an optional leading minus sign, which
-//      is converted and stored in its place.
-// Any other code fails the check.
 class ParameterChecker {
  public:
   // True when every rule holds: each necessary parameter is present and
