@@ -1,6 +1,7 @@
 #include "common/file_util.h"
 
 #include <fcntl.h>
+#include <limits.h>
 #include <net/if.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -80,6 +81,13 @@ bool WriteAll(int fd, const char* data, size_t size) {
     size -= static_cast<size_t>(written);
   }
   return true;
+}
+
+std::string ExecutableDirectory() {
+  char executable[PATH_MAX];
+  ssize_t length = readlink("/proc/self/exe", executable, sizeof(executable) - 1);
+  if (length <= 0) return ".";
+  return DirectoryOf(std::string(executable, static_cast<size_t>(length)));
 }
 
 void SyncDirectory(const std::string& path) {

@@ -22,6 +22,9 @@ bool MakeDirectories(const std::string& path);
 // and short writes. False with errno set when a write fails.
 bool WriteAll(int fd, const char* data, size_t size);
 
+// The folder of the running program; "." when it cannot be read.
+std::string ExecutableDirectory();
+
 // Flushes the folder `path` so that renames in it outlast a power cut.
 // Failures are ignored: the renames themselves are done.
 void SyncDirectory(const std::string& path);

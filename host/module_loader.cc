@@ -1,8 +1,8 @@
 #include "host/module_loader.h"
 
 #include <dlfcn.h>
-#include <limits.h>
-#include <unistd.h>
+
+#include "common/file_util.h"
 
 ModuleLoader::~ModuleLoader() {
   if (library_ != nullptr) dlclose(library_);
@@ -32,12 +32,5 @@ bool ModuleLoader::Load(const std::string& path, std::string* error) {
 }
 
 std::string ModuleLoader::DefaultModulePath() {
-  char executable[PATH_MAX];
-  ssize_t length = readlink("/proc/self/exe", executable, sizeof(executable) - 1);
-  std::string directory = ".";
-  if (length > 0) {
-    std::string path(executable, static_cast<size_t>(length));
-    directory = path.substr(0, path.rfind('/'));
-  }
-  return directory + "/ORVA.Core.Certificate.so";
+  return ExecutableDirectory() + "/ORVA.Core.Certificate.so";
 }

@@ -1,6 +1,5 @@
 #include "host/static_files.h"
 
-#include <limits.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -8,6 +7,8 @@
 #include <fstream>
 #include <iterator>
 #include <memory>
+
+#include "common/file_util.h"
 
 namespace {
 
@@ -104,12 +105,6 @@ void StaticFiles::Serve(const httplib::Request& request,
 }
 
 std::string StaticFiles::DefaultDirectory() {
-  char executable[PATH_MAX];
-  ssize_t length = readlink("/proc/self/exe", executable, sizeof(executable) - 1);
-  if (length > 0) {
-    std::string path(executable, static_cast<size_t>(length));
-    std::string beside = path.substr(0, path.rfind('/')) + "/web";
-    if (IsDirectory(beside)) return beside;
-  }
-  return ORVA_SOURCE_WEB_DIR;
+  std::string beside = ExecutableDirectory() + "/web";
+  return IsDirectory(beside) ? beside : ORVA_SOURCE_WEB_DIR;
 }
