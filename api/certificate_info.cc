@@ -7,6 +7,7 @@
 #include <memory>
 
 #include "api/certificate_facts.h"
+#include "common/file_util.h"
 #include "common/raii.h"
 #include "common/store_paths.h"
 #include "platform/olib/orva_root.h"
@@ -27,20 +28,6 @@ const NameAttribute kNameAttributes[] = {
     {"common_name", NID_commonName},
     {"email", NID_pkcs9_emailAddress},
 };
-
-// The content of the file at `path`, up to its end or the first read error
-// (which ends the decoding as it would end reading from the file). False
-// only when the file cannot be opened.
-bool ReadWholeFile(const std::string& path, std::string* content) {
-  FilePtr file(std::fopen(path.c_str(), "r"));
-  if (!file) return false;
-  char chunk[4096];
-  size_t got;
-  while ((got = std::fread(chunk, 1, sizeof(chunk), file.get())) > 0) {
-    content->append(chunk, got);
-  }
-  return true;
-}
 
 // The role of a store file, or null for any other path.
 const char* FileType(const std::string& path) {

@@ -1,5 +1,3 @@
-#include <unistd.h>
-
 #include <cstdio>
 #include <string>
 
@@ -9,7 +7,6 @@
 #include "common/api_errors.h"
 #include "common/log.h"
 #include "common/store_paths.h"
-#include "platform/olib/olib_file.h"
 #include "platform/olib/orva_root.h"
 #include "platform/webapi/api_polling.h"
 #include "toolkit/activation.h"
@@ -47,11 +44,20 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
     ORVA_LOG("fill argument from json failed");
     return kErrFailed;
   }
-  // Both subjects and the names are checked before the first file is
-  // written: a refusal must not leave a new key beside the old certificate.
+  // Everything the steps would refuse is refused before the first file is
+  // written, in the order the steps would meet it: the CA's key size, the
+  // CA's subject, the server's key size, its subject and the names.
+  if (!IsAcceptedKeySize(static_cast<unsigned int>(ca_key_length))) {
+    ORVA_LOG("Generate CA key & crt failed");
+    return kErrFailed;
+  }
   if (checkCsrSubject(&ca_record) != 0) {
     ORVA_LOG("Generate CA key & crt failed");
     return kErrBadParameter;
+  }
+  if (!IsAcceptedKeySize(static_cast<unsigned int>(key_length))) {
+    ORVA_LOG("Generate server key failed");
+    return kErrFailed;
   }
   if (checkCsrSubject(&server_record) != 0) {
     ORVA_LOG("Generate csr failed");
@@ -62,18 +68,20 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
     return kErrFailed;
   }
 
-  int made = genCASet(&ca_record, ca_key_length);
+  // The CA, the server pair and the removal of the old intermediate file
+  // are one set, installed once all of it is made and proved: a failure on
+  // the way leaves the running CA, key and certificate together.
+  StoreFileSet set;
+  std::string ca_key, ca_crt;
+  int made = genCASetInto(&set, &ca_record, ca_key_length, &ca_key, &ca_crt);
   if (made != 0) {
     ORVA_LOG("Generate CA key & crt failed");
     return made == -2 ? kErrBadParameter : kErrFailed;
   }
-  // The live pair is made under work names and installed only once proved:
-  // a failure on the way leaves the running key and certificate together.
-  StoreFileSet server_pair;
   const std::string server_key =
-      server_pair.Add(OrvaPath(kServerKeyPath), StoreContent::kPrivateKey);
+      set.Add(OrvaPath(kServerKeyPath), StoreContent::kPrivateKey);
   const std::string server_crt =
-      server_pair.Add(OrvaPath(kServerCrtPath), StoreContent::kCertificate);
+      set.Add(OrvaPath(kServerCrtPath), StoreContent::kCertificate);
   if (genKey(server_key.c_str(), static_cast<unsigned int>(key_length)) == -1) {
     ORVA_LOG("Generate server key failed");
     return kErrFailed;
@@ -85,8 +93,8 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
     ORVA_LOG("Generate csr failed");
     return kErrFailed;
   }
-  if (genServerCrt(server_request.path(), server_crt.c_str(), kServerValidityDays,
-                   aliases.c_str()) == -1) {
+  if (genServerCrtHelper(server_request.path(), ca_crt.c_str(), server_crt.c_str(),
+                         ca_key.c_str(), kServerValidityDays, aliases.c_str()) == -1) {
     ORVA_LOG("Generate crt failed");
     return kErrFailed;
   }
@@ -94,13 +102,9 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
     ORVA_LOG("Server crt and key is not matching.");
     return kErrFailed;
   }
-  if (server_pair.Install() != 0) {
+  set.Remove(OrvaPath(kInterCrtPath));
+  if (set.Install() != 0) {
     ORVA_LOG("Install server crt and key failed");
-    return kErrFailed;
-  }
-  const std::string intermediate = OrvaPath(kInterCrtPath);
-  if (OLIBCFileExist(intermediate.c_str()) == 1 && unlink(intermediate.c_str()) == -1) {
-    ORVA_LOG("Unlink internal certificate failed");
     return kErrFailed;
   }
   return kErrNone;

@@ -72,6 +72,27 @@ bool MakeDirectories(const std::string& path) {
   return true;
 }
 
+bool ReadWholeFile(const std::string& path, std::string* content) {
+  FilePtr file(std::fopen(path.c_str(), "re"));
+  if (!file) return false;
+  char chunk[4096];
+  size_t got;
+  while ((got = std::fread(chunk, 1, sizeof(chunk), file.get())) > 0) {
+    content->append(chunk, got);
+  }
+  return true;
+}
+
+bool OverwriteFile(const std::string& path, const std::string& text) {
+  int fd = open(path.c_str(), O_WRONLY | O_TRUNC | O_CLOEXEC | O_NOFOLLOW);
+  if (fd < 0) return false;
+  bool written = WriteAll(fd, text.data(), text.size());
+  int error = errno;
+  if (close(fd) != 0 && written) return false;
+  errno = error;
+  return written;
+}
+
 bool WriteAll(int fd, const char* data, size_t size) {
   while (size > 0) {
     ssize_t written = write(fd, data, size);

@@ -18,6 +18,14 @@ std::string DirectoryOf(const std::string& path);
 // "COMMAND failed.(errno:N/TEXT)" (folders made on the way stay).
 bool MakeDirectories(const std::string& path);
 
+// Appends the content of the file at `path` to *content, up to its end or
+// the first read error. False only when the file cannot be opened.
+bool ReadWholeFile(const std::string& path, std::string* content);
+
+// Writes `text` over the content of the existing file at `path`, keeping
+// its mode. False (errno set) when it cannot.
+bool OverwriteFile(const std::string& path, const std::string& text);
+
 // Writes all `size` bytes at `data` to `fd`, retrying after interruptions
 // and short writes. False with errno set when a write fails.
 bool WriteAll(int fd, const char* data, size_t size);

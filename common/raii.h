@@ -26,6 +26,11 @@ struct EvpPkeyDeleter {
 };
 using EvpPkeyPtr = std::unique_ptr<EVP_PKEY, EvpPkeyDeleter>;
 
+struct X509NameDeleter {
+  void operator()(X509_NAME* name) const { X509_NAME_free(name); }
+};
+using X509NamePtr = std::unique_ptr<X509_NAME, X509NameDeleter>;
+
 struct BioDeleter {
   void operator()(BIO* bio) const { BIO_free(bio); }
 };

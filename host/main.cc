@@ -8,10 +8,10 @@
 #include <cstring>
 #include <fstream>
 #include <iostream>
-#include <iterator>
 #include <string>
 #include <vector>
 
+#include "common/file_util.h"
 #include "host/api_call.h"
 #include "host/device_root_init.h"
 #include "host/listen_address.h"
@@ -44,14 +44,6 @@ int RunInit(const std::string& root) {
   std::printf("device root ready: %s\naccess token: %s\n", root.c_str(),
               TokenPath(root).c_str());
   return 0;
-}
-
-bool ReadWholeFile(const std::string& path, std::string* content) {
-  std::ifstream file(path, std::ios::binary);
-  if (!file) return false;
-  content->assign(std::istreambuf_iterator<char>(file),
-                  std::istreambuf_iterator<char>());
-  return !file.bad();
 }
 
 struct CallArguments {

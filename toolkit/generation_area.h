@@ -7,8 +7,9 @@
 // handed out once: a pending key and request, a signed certificate.
 
 // Makes the generation area with mode 0700 when it is missing (one level,
-// its parent must exist); an existing one is used as it is, mode
-// unchanged. Returns false (errno set) when it cannot be made.
+// its parent must exist); an existing one is given mode 0700 when it has
+// another. Returns false (errno set) when it cannot be made, is not a
+// folder or its mode cannot be set.
 bool MakeGenerationArea();
 
 // A path in the generation area under the device root for work in progress

@@ -9,6 +9,7 @@
 #include "platform/olib/olib_szlist.h"
 #include "platform/olib/olib_types.h"
 #include "toolkit/csr_argument.h"
+#include "toolkit/store_file.h"
 
 // The certificate toolkit: keys, requests and certificates made with the
 // device's openssl tool, key/certificate matching and chain verification.
@@ -41,6 +42,9 @@ int genDir(const char* path);
 // null or empty path, a size of 0 or above 16384, a directory that cannot
 // be made, or a tool failure.
 int genKey(const char* keyPath, unsigned int bits);
+
+// True for a key size genKey makes: 1 to 16384 bits.
+bool IsAcceptedKeySize(unsigned int bits);
 
 // Writes the request configuration at `configPath` from `subject` and makes
 // a request for the existing key `keyPath` at `requestPath` (mode 0400).
@@ -134,6 +138,14 @@ int verifyCrtAndKey(const char* certPath, const char* keyPath, CYPHER keyType);
 // a pair that does not match), logged; the earlier CA then stays as it
 // was (only its configuration and extension files are rewritten).
 int genCASet(CSR_ARGUMENT* subject, int bits);
+
+// Makes the local CA as genCASet does, as members of `set`, which the
+// caller installs with files that must go with it. Stores the temporary
+// paths of the new CA key and certificate in *key and *certificate (for
+// signing before the install). The results are genCASet's; nothing is
+// installed either way.
+int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, int bits,
+                 std::string* key, std::string* certificate);
 
 // Appends every certificate of the PEM file at `path` to `certificates`,
 // which owns them; reading stops quietly at the first block that is not a

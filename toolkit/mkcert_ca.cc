@@ -11,37 +11,41 @@ namespace {
 constexpr int kCaValidityDays = 3650;
 }  // namespace
 
-int genCASet(CSR_ARGUMENT* subject, int bits) {
-  // Made under work names and installed only as a proven set: a CA key
-  // beside the certificate of another key could sign nothing.
-  StoreFileSet set;
-  const std::string request = set.Add(OrvaPath(kCaCsrPath), StoreContent::kRequest);
-  const std::string certificate =
-      set.Add(OrvaPath(kCaCrtPath), StoreContent::kCertificate);
-  const std::string key = set.Add(OrvaPath(kCaKeyPath), StoreContent::kPrivateKey);
+int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, int bits,
+                 std::string* key, std::string* certificate) {
+  const std::string request = set->Add(OrvaPath(kCaCsrPath), StoreContent::kRequest);
+  *certificate = set->Add(OrvaPath(kCaCrtPath), StoreContent::kCertificate);
+  *key = set->Add(OrvaPath(kCaKeyPath), StoreContent::kPrivateKey);
 
-  int result = genKey(key.c_str(), static_cast<unsigned int>(bits));
+  int result = genKey(key->c_str(), static_cast<unsigned int>(bits));
   if (result != 0) {
     ORVA_LOG("genCAKey() failed");
     return result;
   }
-  result = genCsr(OrvaPath(kCaCfgPath).c_str(), key.c_str(), request.c_str(),
+  result = genCsr(OrvaPath(kCaCfgPath).c_str(), key->c_str(), request.c_str(),
                   subject);
   if (result != 0) {
     ORVA_LOG("genCACsr() failed");
     return result;
   }
-  result = genCACrtHelper(request.c_str(), certificate.c_str(), key.c_str(),
+  result = genCACrtHelper(request.c_str(), certificate->c_str(), key->c_str(),
                           kCaValidityDays);
   if (result != 0) {
     ORVA_LOG("genCACrt() failed");
     return result;
   }
-  result = verifyCrtAndKey(certificate.c_str(), key.c_str(), CYPHER_RSA);
-  if (result != 0) {
-    ORVA_LOG("Root certificate and key is not matching");
-    return result;
-  }
+  result = verifyCrtAndKey(certificate->c_str(), key->c_str(), CYPHER_RSA);
+  if (result != 0) ORVA_LOG("Root certificate and key is not matching");
+  return result;
+}
+
+int genCASet(CSR_ARGUMENT* subject, int bits) {
+  // Made under work names and installed only as a proven set: a CA key
+  // beside the certificate of another key could sign nothing.
+  StoreFileSet set;
+  std::string key, certificate;
+  int result = genCASetInto(&set, subject, bits, &key, &certificate);
+  if (result != 0) return result;
   if (set.Install() != 0) {
     ORVA_LOG("Install CA set failed");
     return -1;

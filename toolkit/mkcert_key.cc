@@ -46,9 +46,12 @@ int genDir(const char* path) {
   return MakeDirectories(DirectoryOf(path)) ? 0 : -1;
 }
 
+bool IsAcceptedKeySize(unsigned int bits) {
+  return bits != 0 && bits <= kMaxKeyBits;
+}
+
 int genKey(const char* keyPath, unsigned int bits) {
-  if (keyPath == nullptr || *keyPath == '\0' || bits == 0 ||
-      bits > kMaxKeyBits) {
+  if (keyPath == nullptr || *keyPath == '\0' || !IsAcceptedKeySize(bits)) {
     ORVA_LOG("genKey sanity failed");
     return -1;
   }

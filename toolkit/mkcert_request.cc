@@ -1,8 +1,13 @@
 // Certificate signing requests and their configuration file.
 
+#include <openssl/err.h>
+#include <openssl/objects.h>
+#include <openssl/x509.h>
+
 #include <string>
 
 #include "common/log.h"
+#include "common/raii.h"
 #include "common/shell_command.h"
 #include "platform/olib/olib_file.h"
 #include "toolkit/mkcert.h"
@@ -13,18 +18,19 @@ namespace {
 
 struct SubjectLine {
   const char* key;
+  int nid;
   std::string CSR_ARGUMENT::*member;
 };
 
 // The subject lines of the configuration, in the order they are written.
 const SubjectLine kSubjectLines[] = {
-    {"countryName", &CSR_ARGUMENT::country},
-    {"stateOrProvinceName", &CSR_ARGUMENT::state},
-    {"localityName", &CSR_ARGUMENT::city},
-    {"0.organizationName", &CSR_ARGUMENT::organization},
-    {"organizationalUnitName", &CSR_ARGUMENT::department},
-    {"commonName", &CSR_ARGUMENT::common_name},
-    {"emailAddress", &CSR_ARGUMENT::email},
+    {"countryName", NID_countryName, &CSR_ARGUMENT::country},
+    {"stateOrProvinceName", NID_stateOrProvinceName, &CSR_ARGUMENT::state},
+    {"localityName", NID_localityName, &CSR_ARGUMENT::city},
+    {"0.organizationName", NID_organizationName, &CSR_ARGUMENT::organization},
+    {"organizationalUnitName", NID_organizationalUnitName, &CSR_ARGUMENT::department},
+    {"commonName", NID_commonName, &CSR_ARGUMENT::common_name},
+    {"emailAddress", NID_pkcs9_emailAddress, &CSR_ARGUMENT::email},
 };
 
 bool HasControlCharacter(const std::string& value) {
@@ -39,6 +45,26 @@ bool SubjectHasControlCharacter(const CSR_ARGUMENT& subject) {
     if (HasControlCharacter(subject.*line.member)) return true;
   }
   return false;
+}
+
+// The first value the tool would refuse to put into a name (too long, or
+// characters its string type cannot hold: the library applies the same
+// rules as the tool), or null when it takes them all. Empty values are
+// left out of the request.
+const std::string* ValueRefusedInName(const CSR_ARGUMENT& subject) {
+  X509NamePtr name(X509_NAME_new());
+  for (const SubjectLine& line : kSubjectLines) {
+    const std::string& value = subject.*line.member;
+    if (value.empty()) continue;
+    if (!name || X509_NAME_add_entry_by_NID(
+                     name.get(), line.nid, MBSTRING_UTF8,
+                     reinterpret_cast<const unsigned char*>(value.data()),
+                     static_cast<int>(value.size()), -1, 0) != 1) {
+      ERR_clear_error();
+      return &value;
+    }
+  }
+  return nullptr;
 }
 
 // "key<blanks>= value" with the "=" in the 33rd column.
@@ -106,6 +132,11 @@ int checkCsrSubject(const CSR_ARGUMENT* subject) {
     return -2;
   }
   if (SubjectHasControlCharacter(*subject)) {
+    ORVA_LOG_LASTERR("CSR Argument error");
+    return -2;
+  }
+  if (const std::string* refused = ValueRefusedInName(*subject)) {
+    ORVA_LOG("Subject value \"%s\" does not fit a certificate name", refused->c_str());
     ORVA_LOG_LASTERR("CSR Argument error");
     return -2;
   }

@@ -1,8 +1,10 @@
 // Certificates signed from requests: self-signed CA certificates and server
 // certificates signed by the local CA.
 
+#include <cerrno>
 #include <string>
 
+#include "common/file_util.h"
 #include "common/log.h"
 #include "common/shell_command.h"
 #include "platform/olib/olib_file.h"
@@ -80,6 +82,23 @@ int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,
   }
 
   StoreFileSet set;
+  // The tool rewrites its serial file in place, through a link if there is
+  // one: it gets a copy, which replaces the serial file with the
+  // certificate.
+  std::string serialCopy;
+  if (selfSigned != TRUE) {
+    std::string serial;
+    if (!ReadWholeFile(serialPath, &serial)) {
+      ORVA_LOG("Read %s failed.(errno:%d/%m)", serialPath, errno);
+      return -1;
+    }
+    serialCopy = set.Add(serialPath, StoreContent::kText);
+    if (serialCopy.empty()) return -1;
+    if (!OverwriteFile(serialCopy, serial)) {
+      ORVA_LOG("Write %s failed.(errno:%d/%m)", serialCopy.c_str(), errno);
+      return -1;
+    }
+  }
   const std::string certificate = set.Add(output, StoreContent::kCertificate);
   if (certificate.empty()) return -1;
   ShellCommand command(RootedCommandSize(kToolkitCommandSize));
@@ -90,7 +109,7 @@ int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,
     command.Append(" -signkey %s >/dev/null 2>&1", {keyPath});
   } else {
     command.Append(" -CAserial %s -CA %s -CAkey %s >/dev/null 2>&1",
-                   {serialPath, caOrOutput, keyPath});
+                   {serialCopy, caOrOutput, keyPath});
   }
   if (!ToolExitedCleanly(RunShellCommand(command))) {
     ORVA_LOG("Error when execute \"%s\"", command.line());

@@ -83,10 +83,10 @@ bool SyncFile(const std::string& path) {
 }  // namespace
 
 StoreFileSet::~StoreFileSet() {
-  if (installed_) return;
   for (const Member& member : members_) {
-    // Ignoring errors: a member renamed before a failure is gone already.
+    // Ignoring errors: these names are gone once installed or put back.
     if (!member.temporary.empty()) unlink(member.temporary.c_str());
+    if (!member.kept.empty()) unlink(member.kept.c_str());
   }
 }
 
@@ -98,42 +98,104 @@ std::string StoreFileSet::Add(const std::string& target, StoreContent content) {
     ORVA_LOG_LASTERR("Create temporary file for %s failed", target.c_str());
     failed_ = true;
   }
-  members_.push_back({target, temporary, content});
+  members_.push_back({target, temporary, content, ""});
   return temporary;
+}
+
+void StoreFileSet::Remove(const std::string& target) {
+  members_.push_back({target, "", StoreContent::kText, ""});
+}
+
+bool StoreFileSet::Prepare(const Member& member) {
+  if (member.temporary.empty()) return true;
+  if (!HoldsWhole(member.temporary, member.content)) {
+    ORVA_LOG("The tool's output for %s is incomplete", member.target.c_str());
+    return false;
+  }
+  if (!SyncFile(member.temporary)) {
+    OLIB_SET_ERROR(errno);
+    ORVA_LOG_LASTERR("Flush %s failed", member.temporary.c_str());
+    return false;
+  }
+  if (chmod(member.temporary.c_str(), ModeOf(member.content)) != 0) {
+    ORVA_LOG("chmod(%s) failed", member.target.c_str());
+    return false;
+  }
+  return true;
+}
+
+// Keeps the old file under a second name, so it can be put back. A folder
+// in the way is not kept: its rename fails and the set is put back.
+bool StoreFileSet::Keep(Member* member) {
+  struct stat info;
+  if (lstat(member->target.c_str(), &info) != 0 || S_ISDIR(info.st_mode)) {
+    return true;
+  }
+  std::string kept = CreateTemporary(member->target);
+  if (kept.empty() || unlink(kept.c_str()) != 0 ||
+      link(member->target.c_str(), kept.c_str()) != 0) {
+    OLIB_SET_ERROR(errno);
+    ORVA_LOG_LASTERR("Keep %s failed", member->target.c_str());
+    return false;
+  }
+  member->kept = kept;
+  return true;
+}
+
+bool StoreFileSet::Replace(Member* member) {
+  if (member->temporary.empty()) {
+    if (unlink(member->target.c_str()) != 0 && errno != ENOENT) {
+      OLIB_SET_ERROR(errno);
+      ORVA_LOG_LASTERR("Remove %s failed", member->target.c_str());
+      return false;
+    }
+    return true;
+  }
+  if (rename(member->temporary.c_str(), member->target.c_str()) != 0) {
+    OLIB_SET_ERROR(errno);
+    ORVA_LOG_LASTERR("Rename %s to %s failed", member->temporary.c_str(),
+                     member->target.c_str());
+    return false;
+  }
+  member->temporary.clear();
+  return true;
+}
+
+void StoreFileSet::PutBack(Member* member) {
+  // Ignoring errors: each step puts back what it can.
+  if (member->kept.empty()) {
+    unlink(member->target.c_str());
+  } else {
+    rename(member->kept.c_str(), member->target.c_str());
+    member->kept.clear();
+  }
 }
 
 int StoreFileSet::Install() {
   if (failed_) return -1;
   for (const Member& member : members_) {
-    if (!HoldsWhole(member.temporary, member.content)) {
-      ORVA_LOG("The tool's output for %s is incomplete", member.target.c_str());
-      return -1;
-    }
-    if (!SyncFile(member.temporary)) {
-      OLIB_SET_ERROR(errno);
-      ORVA_LOG_LASTERR("Flush %s failed", member.temporary.c_str());
-      return -1;
-    }
-    if (chmod(member.temporary.c_str(), ModeOf(member.content)) != 0) {
-      ORVA_LOG("chmod(%s) failed", member.target.c_str());
-      return -1;
-    }
+    if (!Prepare(member)) return -1;
   }
   // Keys go last: until then the old key stays beside the files it matches.
+  std::vector<Member*> order;
   for (bool keys : {false, true}) {
     for (Member& member : members_) {
-      if ((member.content == StoreContent::kPrivateKey) != keys) continue;
-      if (rename(member.temporary.c_str(), member.target.c_str()) != 0) {
-        OLIB_SET_ERROR(errno);
-        ORVA_LOG_LASTERR("Rename %s to %s failed", member.temporary.c_str(),
-                         member.target.c_str());
-        return -1;
-      }
-      member.temporary.clear();
-      SyncDirectory(DirectoryOf(member.target));
+      if ((member.content == StoreContent::kPrivateKey) == keys) order.push_back(&member);
     }
   }
-  installed_ = true;
+  for (Member* member : order) {
+    if (!Keep(member)) return -1;
+  }
+  for (size_t done = 0; done < order.size(); ++done) {
+    if (Replace(order[done])) continue;
+    while (done > 0) PutBack(order[--done]);
+    return -1;
+  }
+  for (Member* member : order) {
+    SyncDirectory(DirectoryOf(member->target));
+    if (!member->kept.empty()) unlink(member->kept.c_str());
+    member->kept.clear();
+  }
   return 0;
 }
 

@@ -28,8 +28,10 @@ enum class StoreContent {
 // empty or cut file), flushes it to the disk, gives it its mode and renames
 // it over its target, private keys last, then flushes the folders. A reader
 // sees each old file or the new one; a 0400 file can be replaced by its
-// owner, since only the folder is written. Temporary files that were not
-// installed are removed by the destructor.
+// owner, since only the folder is written. The set is installed whole or
+// not at all: the old files are kept under temporary names (hard links)
+// until the last rename succeeded, and put back when one fails. Temporary
+// files that were not installed are removed by the destructor.
 class StoreFileSet {
  public:
   StoreFileSet() = default;
@@ -44,21 +46,31 @@ class StoreFileSet {
   // cannot be created, and Install() then fails.
   std::string Add(const std::string& target, StoreContent content);
 
+  // Adds the removal of `target` (a real path) to the set: the file goes
+  // when the set is installed, before the private keys, and comes back
+  // when the install fails. A missing file is no failure.
+  void Remove(const std::string& target);
+
   // Installs every member as described above. 0 on success; -1 (logged)
   // when a member could not be made, does not hold a whole object of its
-  // kind or cannot be flushed, given its mode or renamed: the members
-  // renamed before the failure stay installed, the rest are not.
+  // kind or cannot be flushed, given its mode, kept or renamed: every
+  // target then holds its old file again (or is absent, as before).
   int Install();
 
  private:
   struct Member {
     std::string target;
-    std::string temporary;
+    std::string temporary;  // the new content; "" for a removal
     StoreContent content;
+    std::string kept;       // the old file, while the set is installed
   };
+  bool Prepare(const Member& member);
+  bool Keep(Member* member);
+  bool Replace(Member* member);
+  void PutBack(Member* member);
+
   std::vector<Member> members_;
   bool failed_ = false;
-  bool installed_ = false;
 };
 
 // Replaces the file at `path` with `text`, whole, the same way (mode 0644),

@@ -62,6 +62,16 @@ bool RemovedPlainArchive(const char* archive) {
 
 int SSLCAFormHandler::CreateArchive(const char** files, const char* archive,
                                     int count) {
+  // Members are counted before the previous archive goes: a client that
+  // asks again for a set handed out once must not lose the last copy.
+  int present = 0;
+  for (int i = 0; i < count; ++i) {
+    if (access(files[i], F_OK) == 0) ++present;
+  }
+  if (present == 0) {
+    ORVA_LOG("No file will be compress");
+    return -1;
+  }
   if (!RemovedPlainArchive(archive)) {
     ShellCommand remove(RootedCommandSize(kExportCommandSize));
     remove.Append("/bin/rm -rf %s", {archive});
@@ -71,19 +81,13 @@ int SSLCAFormHandler::CreateArchive(const char** files, const char* archive,
     }
   }
 
+  // The archive holds keys: the archiver makes it owner-only from the start.
   ShellCommand pack(RootedCommandSize(kExportCommandSize));
-  pack.Append("%s a %s", {OrvaPath(k7zTool), archive});
-  int packed = 0;
+  pack.Append("umask 077; %s a %s", {OrvaPath(k7zTool), archive});
   for (int i = 0; i < count; ++i) {
-    if (access(files[i], F_OK) != 0) continue;
-    pack.Append(" %s", {files[i]});
-    ++packed;
+    if (access(files[i], F_OK) == 0) pack.Append(" %s", {files[i]});
   }
   pack.Append(" >/dev/null 2>&1");
-  if (packed == 0) {
-    ORVA_LOG("No file will be compress");
-    return -1;
-  }
   if (RunShellCommand(pack) != 0) {
     ORVA_LOG_LASTERR("7z file failed");
     return -1;

@@ -38,9 +38,11 @@ class SSLCAFormHandler : public ServerFormHandler {
   // Makes the ZIP archive `archive` (a real path) with the device's 7z tool
   // from those of the `count` paths in `files` that exist; members are
   // stored under their file names. The previous archive is removed first,
-  // so on failure no archive is left. On success the archive has mode 0400.
-  // Returns 0, or -1 (logged) when the old archive cannot be removed, no
-  // member exists or the tool fails.
+  // so on failure no archive is left, except when no member exists: then
+  // the previous archive stays as it was. The archive is owner-only while
+  // it is made and has mode 0400 on success. Returns 0, or -1 (logged)
+  // when no member exists, the old archive cannot be removed or the tool
+  // fails.
   int CreateArchive(const char** files, const char* archive, int count);
 
   // Tests whether the first line of `file` (up to and including the first
