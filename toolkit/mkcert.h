@@ -154,9 +154,11 @@ int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, int bits,
 // (logged) when not, `certificates` unchanged.
 int loadCrtList(const char* path, std::vector<X509Ptr>& certificates);
 
-// 0 when the certificates of both files form one issuing chain (all but one
-// issued another certificate of the set, in any order); 1 when not or when
-// neither file holds a certificate; -1 (logged) for a null, empty or absent
+// 0 when the certificates of both files form one issuing chain: from the
+// first certificate of `certPath` upwards, each certificate is issued
+// (names agree, signature verifies with the issuer's key) by another of the
+// set, in whatever order the files hold them, and none is left over; 1
+// when not or when neither file holds a certificate; -1 (logged) for a null, empty or absent
 // path or a file that cannot be opened.
 int verifyCrtChain(const char* certPath, const char* upperPath);
 

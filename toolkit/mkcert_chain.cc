@@ -1,8 +1,9 @@
 // Whether a certificate and a file of upper certificates form one issuing
-// chain, judged by their distinguished names.
+// chain, judged by names and signatures.
 
 #include <openssl/err.h>
 #include <openssl/pem.h>
+#include <openssl/x509v3.h>
 
 #include <cerrno>
 #include <cstdio>
@@ -19,17 +20,13 @@ bool IsPresentFile(const char* path) {
   return path != nullptr && *path != '\0' && OLIBCFileExist(path) != 0;
 }
 
-// True when `issuer` issued some other certificate of the list.
-bool IssuedAnother(const std::vector<X509Ptr>& certificates, size_t issuer) {
-  X509_NAME* subject = X509_get_subject_name(certificates[issuer].get());
-  for (size_t j = 0; j < certificates.size(); ++j) {
-    if (j == issuer) continue;
-    if (X509_NAME_cmp(subject, X509_get_issuer_name(certificates[j].get())) ==
-        0) {
-      return true;
-    }
-  }
-  return false;
+// True when `issuer` issued `subject`: the names agree and the issuer's
+// key verifies the subject's signature.
+bool Issued(X509* issuer, X509* subject) {
+  bool issued = X509_check_issued(issuer, subject) == X509_V_OK &&
+                X509_verify(subject, X509_get0_pubkey(issuer)) == 1;
+  ERR_clear_error();
+  return issued;
 }
 
 }  // namespace
@@ -65,9 +62,20 @@ int verifyCrtChain(const char* certPath, const char* upperPath) {
     return -1;
   }
   if (certificates.empty()) return 1;
-  size_t issuers = 0;
-  for (size_t i = 0; i < certificates.size(); ++i) {
-    if (IssuedAnother(certificates, i)) ++issuers;
+  // From the first certificate upwards, each step taken by a certificate
+  // that issued the one below it, in whatever order the files hold them.
+  // Every other certificate must be on that path.
+  std::vector<bool> used(certificates.size(), false);
+  used[0] = true;
+  size_t below = 0;
+  for (size_t placed = 1; placed < certificates.size(); ++placed) {
+    size_t next = 0;
+    for (size_t i = 1; i < certificates.size() && next == 0; ++i) {
+      if (!used[i] && Issued(certificates[i].get(), certificates[below].get())) next = i;
+    }
+    if (next == 0) return 1;
+    used[next] = true;
+    below = next;
   }
-  return issuers + 1 >= certificates.size() ? 0 : 1;
+  return 0;
 }

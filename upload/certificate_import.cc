@@ -1,11 +1,16 @@
 #include <fcntl.h>
+#include <openssl/pem.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <string>
+#include <vector>
 
 #include "common/api_errors.h"
+#include "common/file_util.h"
 #include "common/log.h"
+#include "common/raii.h"
 #include "common/shell_command.h"
 #include "common/store_paths.h"
 #include "platform/olib/olib_file.h"
@@ -29,6 +34,31 @@ bool IsReadableRegularFile(const std::string& path) {
   bool regular = fstat(fd, &info) == 0 && S_ISREG(info.st_mode);
   close(fd);
   return regular;
+}
+
+// Rewrites the copy at `path` (still private to its owner) with its
+// certificates alone, so a key block uploaded beside a certificate never
+// reaches a file that everyone may read. False (logged) when it cannot.
+bool KeepCertificatesOnly(const std::string& path) {
+  std::vector<X509Ptr> certificates;
+  BioPtr text(BIO_new(BIO_s_mem()));
+  if (loadCrtList(path.c_str(), certificates) != 0 || certificates.empty() || !text) {
+    ORVA_LOG("Read certificates of %s failed", path.c_str());
+    return false;
+  }
+  for (const X509Ptr& certificate : certificates) {
+    if (PEM_write_bio_X509(text.get(), certificate.get()) != 1) {
+      ORVA_LOG("Write certificates of %s failed", path.c_str());
+      return false;
+    }
+  }
+  char* data = nullptr;
+  long size = BIO_get_mem_data(text.get(), &data);
+  if (!OverwriteFile(path, std::string(data, static_cast<size_t>(size)))) {
+    ORVA_LOG("Write %s failed.(errno:%d/%m)", path.c_str(), errno);
+    return false;
+  }
+  return true;
 }
 
 // Copies the validated uploads into the store: the certificate, the key and,
@@ -65,6 +95,10 @@ int InstallUploads(const std::string& certPath, const std::string& keyPath,
     command.Append("/bin/cp %s %s", {*upload.source, copy});
     if (RunShellCommand(command) != 0) {
       ORVA_LOG("CA copy command failed:%s", command.line());
+      return kErrStoreWrite;
+    }
+    if (upload.content == StoreContent::kImportedCertificate &&
+        !KeepCertificatesOnly(copy)) {
       return kErrStoreWrite;
     }
   }

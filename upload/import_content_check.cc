@@ -4,12 +4,14 @@
 #include <openssl/x509.h>
 
 #include <cstdio>
+#include <memory>
 #include <vector>
 
 #include "common/api_errors.h"
 #include "common/log.h"
 #include "common/pem_password.h"
 #include "common/raii.h"
+#include "platform/olib/olib_file.h"
 #include "upload/sslca_form_handler.h"
 
 namespace {
@@ -48,6 +50,56 @@ int ProvePairWithLibrary(const char* certPath, const char* keyPath) {
   return result;
 }
 
+// True when the first certificate of `certPath` has an RSA key, the only
+// kind whose pair the openssl tool's modulus digests can compare.
+bool HasRsaCertificate(const char* certPath) {
+  FilePtr file(std::fopen(certPath, "r"));
+  if (!file) return false;
+  X509Ptr certificate(
+      PEM_read_X509(file.get(), nullptr, RefusePemPassword, nullptr));
+  ERR_clear_error();
+  return certificate &&
+         EVP_PKEY_get_base_id(X509_get0_pubkey(certificate.get())) == EVP_PKEY_RSA;
+}
+
+// True when the private key of `keyPath` is sound: its private part agrees
+// with itself and with its public part. A key whose public part matches a
+// certificate can still hold a private part no handshake can use.
+bool HoldsSoundKey(const char* keyPath) {
+  FilePtr file(std::fopen(keyPath, "r"));
+  if (!file) return false;
+  EvpPkeyPtr key(PEM_read_PrivateKey(file.get(), nullptr, RefusePemPassword, nullptr));
+  std::unique_ptr<EVP_PKEY_CTX, decltype(&EVP_PKEY_CTX_free)> context(
+      key ? EVP_PKEY_CTX_new_from_pkey(nullptr, key.get(), nullptr) : nullptr,
+      EVP_PKEY_CTX_free);
+  bool sound = context && EVP_PKEY_private_check(context.get()) == 1 &&
+               EVP_PKEY_pairwise_check(context.get()) == 1;
+  ERR_clear_error();
+  return sound;
+}
+
+// 5502 when the key belongs to the certificate and is sound, else 5514 or
+// 5518 (a DSA key). Where the tool can compare (RSA) its answer stands: a
+// match, or a mismatch of two RSA moduli; otherwise, and when the tool
+// cannot tell, only a pair the library proves is accepted. Only failures
+// are logged.
+int ProvePair(const char* cert, const char* key, __tag_CYPHER keyType) {
+  int result = kErrNone;
+  if (HasRsaCertificate(cert)) {
+    int match = verifyCrtAndKey(cert, key, keyType);
+    if (match == 1 && keyType == CYPHER_RSA) return kErrKeyMismatch;
+    if (match != 0 && match != 1) ORVA_LOG("Verify crt and key failed");
+    if (match != 0) result = ProvePairWithLibrary(cert, key);
+  } else {
+    result = ProvePairWithLibrary(cert, key);
+  }
+  if (result == kErrNone && !HoldsSoundKey(key)) {
+    ORVA_LOG("The private key %s fails its consistency check", key);
+    result = kErrKeyMismatch;
+  }
+  return result;
+}
+
 }  // namespace
 
 int SSLCAFormHandler::checkCAContent(const char* cert, const char* key,
@@ -80,13 +132,10 @@ int SSLCAFormHandler::checkCAContent(const char* cert, const char* key,
     }
   }
 
-  // The tool's answer stands where it compared: a match, or a mismatch of
-  // two RSA moduli. Otherwise the tool could not tell (it also answers 1
-  // when it cannot read the modulus of a key not marked RSA), and only a
-  // pair the library proves is accepted.
-  int match = verifyCrtAndKey(cert, key, keyType);
-  if (match == 0) return kErrNone;
-  if (match == 1 && keyType == CYPHER_RSA) return kErrKeyMismatch;
-  if (match != 1) ORVA_LOG("Verify crt and key failed");
-  return ProvePairWithLibrary(cert, key);
+  // The files are installed as they are read here: without the mark.
+  if (OLIBCFileUTF8BomStrip(cert) != 0 || OLIBCFileUTF8BomStrip(key) != 0) {
+    ORVA_LOG("Failed to strip utf8 BOM");
+    return kErrKeyMismatch;
+  }
+  return ProvePair(cert, key, keyType);
 }
