@@ -41,7 +41,7 @@ CertificateFactsList DecodeCertificateFacts(const std::string& pem) {
   CertificateFactsList list;
   BioPtr bio(BIO_new_mem_buf(pem.data(), static_cast<int>(pem.size())));
   if (!bio) return list;
-  for (;;) {
+  while (list.size() <= kMaxListedCertificates) {
     X509Ptr certificate(
         PEM_read_bio_X509(bio.get(), nullptr, RefusePemPassword, nullptr));
     if (!certificate) break;

@@ -18,8 +18,12 @@ struct CertificateFacts {
 
 using CertificateFactsList = std::vector<CertificateFacts>;
 
-// The facts of every PEM certificate in `pem`, in order; decoding stops
-// quietly at the first block that does not decode.
+// A store file lists at most this many certificates.
+inline constexpr size_t kMaxListedCertificates = 64;
+
+// The facts of the PEM certificates in `pem`, in order, at most
+// kMaxListedCertificates + 1 of them (so a caller sees that more follow);
+// decoding stops quietly at the first block that does not decode.
 CertificateFactsList DecodeCertificateFacts(const std::string& pem);
 
 // The facts of the file at `path` whose whole content is `pem`. Decoding a

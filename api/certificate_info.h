@@ -15,9 +15,10 @@
 // append): "issuer", "subject", "signature_algorithm", "valid_from" and
 // "valid_till" when the request's "additional" array names them, and "type"
 // when `path` is one of the three store certificate files under the device
-// root. Reading stops quietly at the first block that does not decode.
+// root. Reading stops quietly at the first block that does not decode, and
+// after kMaxListedCertificates entries (logged: the rest are not listed).
 // Returns 0 when the file was read (also when it held no certificate), 4
-// when it could not be opened (`entries` unchanged). Logs nothing.
+// when it could not be opened (`entries` unchanged).
 int getCertificateInfo(const std::string& path, Json::Value& entries,
                        ORVA::APIRequest* request);
 

@@ -115,5 +115,6 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
 void handleCRTAction(ORVA::APIRequest* request, ORVA::APIResponse* response) {
   ORVA::APIPolling polling;
   int code = CreateCertificateSet(request);
-  answerInstallRequest(kActivateAfterCreation, code, response, __FILE__);
+  answerInstallRequest(kActivateAfterCreation, code, response, __FILE__,
+                       __LINE__);
 }

@@ -12,9 +12,9 @@
 // message is written. The format is printf's, %m included (errno as it was
 // when the macro was reached).
 //
-// ORVA_LOG_AS and ORVA_LOG_LASTERR_AS report for another source file: code
-// that works on behalf of a caller passes the caller's __FILE__, so the
-// message names the caller's file (with the line of the macro).
+// ORVA_LOG_AS and ORVA_LOG_LASTERR_AS report for another place: code that
+// works on behalf of a caller passes the caller's __FILE__ and __LINE__, so
+// the message names the caller's file and line.
 
 void OrvaLogWrite(const char* file, int line, bool withLastError,
                   const char* format, ...)
@@ -25,9 +25,9 @@ void OrvaLogWrite(const char* file, int line, bool withLastError,
 #define ORVA_LOG_LASTERR(format, ...) \
   OrvaLogWrite(__FILE__, __LINE__, true, format, ##__VA_ARGS__)
 
-#define ORVA_LOG_AS(file, format, ...) \
-  OrvaLogWrite(file, __LINE__, false, format, ##__VA_ARGS__)
-#define ORVA_LOG_LASTERR_AS(file, format, ...) \
-  OrvaLogWrite(file, __LINE__, true, format, ##__VA_ARGS__)
+#define ORVA_LOG_AS(file, line, format, ...) \
+  OrvaLogWrite(file, line, false, format, ##__VA_ARGS__)
+#define ORVA_LOG_LASTERR_AS(file, line, format, ...) \
+  OrvaLogWrite(file, line, true, format, ##__VA_ARGS__)
 
 #endif  // ORVA_COMMON_LOG_H_

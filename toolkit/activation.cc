@@ -16,31 +16,37 @@ bool IsYes(const OrvaConf& conf, const char* key) {
 }
 
 void RestartIfEnabled(const char* service, const char* failure,
-                      const char* sourceFile) {
+                      const char* sourceFile, int sourceLine) {
   if (OLIBServiceIsEnabled(service) == 0) return;
-  if (OLIBServiceRestart(service) < 0) ORVA_LOG_AS(sourceFile, "%s", failure);
+  if (OLIBServiceRestart(service) < 0) {
+    ORVA_LOG_AS(sourceFile, sourceLine, "%s", failure);
+  }
 }
 
 // "pagora" takes the place of "httpd-user" when it is enabled; "httpd-user"
 // is restarted without asking whether it is enabled.
-void RestartUserWebServer(const OrvaConf& conf, const char* sourceFile) {
+void RestartUserWebServer(const OrvaConf& conf, const char* sourceFile,
+                          int sourceLine) {
   if (!IsYes(conf, "runWebHTTPS")) return;
   if (OLIBServiceIsEnabled("pagora") != 0) {
     if (OLIBServiceRestart("pagora") < 0) {
-      ORVA_LOG_AS(sourceFile, "Failed to restart Pagora");
+      ORVA_LOG_AS(sourceFile, sourceLine, "Failed to restart Pagora");
     }
   } else if (OLIBServiceRestart("httpd-user") < 0) {
-    ORVA_LOG_AS(sourceFile, "Failed to restart httpd user");
+    ORVA_LOG_AS(sourceFile, sourceLine, "Failed to restart httpd user");
   }
 }
 
-void NotifyPlugins(OLIBPLUGIN_HANDLE* handle, const char* sourceFile) {
+void NotifyPlugins(OLIBPLUGIN_HANDLE* handle, const char* sourceFile,
+                   int sourceLine) {
   if (OLIBPluginSDKInit("certificate", "certificate/change", handle) < 0) {
-    ORVA_LOG_LASTERR_AS(sourceFile, "Fail to do certificate plugin init ");
+    ORVA_LOG_LASTERR_AS(sourceFile, sourceLine,
+                        "Fail to do certificate plugin init ");
   }
   if (OLIBPluginHasInit(*handle) == 0 ||
       OLIBPluginAction(kPostAction, *handle) < 0) {
-    ORVA_LOG_AS(sourceFile, "Fail to do post action for certificate plugin");
+    ORVA_LOG_AS(sourceFile, sourceLine,
+                "Fail to do post action for certificate plugin");
   }
   // A filled handle answers nonzero to OLIBPluginHasInit for as long as it
   // lives, so it is released here, after its only use.
@@ -59,22 +65,24 @@ void AskHostRestart(ORVA::APIResponse* response, Json::Value& result,
 void activateCertificate(ActivationSequence sequence,
                          ORVA::APIResponse* response, Json::Value& result,
                          const OrvaConf& conf, OLIBPLUGIN_HANDLE* handle,
-                         const char* sourceFile) {
+                         const char* sourceFile, int sourceLine) {
   if (sequence == kActivateAfterCreation) {
-    RestartIfEnabled("ftpd-ssl", "Failed to restart FTP", sourceFile);
-    RestartUserWebServer(conf, sourceFile);
+    RestartIfEnabled("ftpd-ssl", "Failed to restart FTP", sourceFile,
+                     sourceLine);
+    RestartUserWebServer(conf, sourceFile, sourceLine);
     RestartIfEnabled("webdav-httpd-ssl", "Failed to restart https WebDAV",
-                     sourceFile);
-    NotifyPlugins(handle, sourceFile);
+                     sourceFile, sourceLine);
+    NotifyPlugins(handle, sourceFile, sourceLine);
     AskHostRestart(response, result, conf);
     return;
   }
   AskHostRestart(response, result, conf);
   RestartIfEnabled("webdav-httpd-ssl", "Failed to restart https webdav",
-                   sourceFile);
-  RestartIfEnabled("ftpd-ssl", "Failed to restart service ftps", sourceFile);
-  RestartUserWebServer(conf, sourceFile);
-  NotifyPlugins(handle, sourceFile);
+                   sourceFile, sourceLine);
+  RestartIfEnabled("ftpd-ssl", "Failed to restart service ftps", sourceFile,
+                   sourceLine);
+  RestartUserWebServer(conf, sourceFile, sourceLine);
+  NotifyPlugins(handle, sourceFile, sourceLine);
 }
 
 void closePluginHandle(OLIBPLUGIN_HANDLE* handle) {
@@ -83,13 +91,15 @@ void closePluginHandle(OLIBPLUGIN_HANDLE* handle) {
 }
 
 void answerInstallRequest(ActivationSequence sequence, int code,
-                          ORVA::APIResponse* response, const char* sourceFile) {
+                          ORVA::APIResponse* response, const char* sourceFile,
+                          int sourceLine) {
   Json::Value result(Json::objectValue);
   result["restart_httpd"] = false;
   OrvaConf conf;
   OLIBPLUGIN_HANDLE plugin = nullptr;
   if (code == kErrNone) {
-    activateCertificate(sequence, response, result, conf, &plugin, sourceFile);
+    activateCertificate(sequence, response, result, conf, &plugin, sourceFile,
+                        sourceLine);
   }
   closePluginHandle(&plugin);
   if (code == kErrNone) {

@@ -27,8 +27,8 @@ enum ActivationSequence {
 // server and sets result["restart_httpd"] to true.
 //
 // Best effort: every failure is logged once and the next step runs; the
-// caller answers success whatever happened. Messages name `sourceFile`
-// (the caller's __FILE__).
+// caller answers success whatever happened. Messages name `sourceFile` and
+// `sourceLine` (the caller's __FILE__ and __LINE__).
 //
 // `result`: the caller's answer object, holding "restart_httpd" false.
 // `conf`: the request's configuration reader. `handle`: the address of the
@@ -38,7 +38,7 @@ enum ActivationSequence {
 void activateCertificate(ActivationSequence sequence,
                          ORVA::APIResponse* response, Json::Value& result,
                          const OrvaConf& conf, OLIBPLUGIN_HANDLE* handle,
-                         const char* sourceFile);
+                         const char* sourceFile, int sourceLine);
 
 // Closing step of a request that may have activated, run on every path
 // before answering: releases a handle that is still held (OLIBPluginExit
@@ -50,6 +50,7 @@ void closePluginHandle(OLIBPLUGIN_HANDLE* handle);
 // the result object {"restart_httpd": bool}; otherwise answers `code` with
 // null data. The plug-in handle is released on both paths.
 void answerInstallRequest(ActivationSequence sequence, int code,
-                          ORVA::APIResponse* response, const char* sourceFile);
+                          ORVA::APIResponse* response, const char* sourceFile,
+                          int sourceLine);
 
 #endif  // ORVA_TOOLKIT_ACTIVATION_H_

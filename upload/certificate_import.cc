@@ -135,5 +135,6 @@ void SSLCAFormHandler::ProcessJsonReq(ORVA::APIRequest* request,
         certPath, keyPath,
         request->HasParam("inter_cert_tmp") ? &interPath : nullptr);
   }
-  answerInstallRequest(kActivateAfterImport, code, response, __FILE__);
+  answerInstallRequest(kActivateAfterImport, code, response, __FILE__,
+                       __LINE__);
 }
