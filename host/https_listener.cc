@@ -59,7 +59,7 @@ void HttpsListener::Apply() {
   std::string problem;
   std::shared_ptr<const ServerCredentials> credentials;
   {
-    CallOrder::Turn reading(store_order_, true);
+    CallOrder::Turn whole_set(store_order_);
     credentials = ServerCredentials::LoadFromStore(&problem);
   }
   if (!credentials) {

@@ -30,8 +30,8 @@ class HttpsListener {
 
   // `install` sets up the routes of every server the listener makes; it is
   // called on the thread that brings the listener up. The store is read in
-  // a reading turn of `store_order` (which must outlive the listener), so a
-  // reload never sees a certificate change half done.
+  // a turn of `store_order` (which must outlive the listener), so a reload
+  // never sees a certificate change half done.
   HttpsListener(ListenAddress address,
                 std::function<void(httplib::Server*)> install, CallOrder* store_order);
   // Stop().

@@ -55,11 +55,12 @@ bool IsAllowedAlias(const char* name) {
 // skipped. False (logged) when a name is neither an address literal nor a
 // host name.
 bool AliasEntries(const OLIBSZLIST* aliases, std::string* entries) {
-  for (uint32_t i = 0; i < aliases->nItem; ++i) {
-    const char* name = OLIBCSzListGet(aliases, i);
+  const std::vector<const char*> names = ListItems(aliases);
+  for (size_t i = 0; i < names.size(); ++i) {
+    const char* name = names[i];
     if (*name == '\0') continue;
     if (!IsAllowedAlias(name)) {
-      ORVA_LOG("Alias %u is neither a host name nor an IP address", i + 1);
+      ORVA_LOG("Alias %zu is neither a host name nor an IP address", i + 1);
       return false;
     }
     bool address = IsAddressLiteral(name);
@@ -118,9 +119,10 @@ int checkAliasText(const char* aliases) {
   if (aliases == nullptr) return 0;
   OLIBSzListPtr names = SplitAliases(aliases);
   if (!names) return -1;
-  for (uint32_t i = 0; i < names->nItem; ++i) {
-    if (!IsAllowedAlias(OLIBCSzListGet(names.get(), i))) {
-      ORVA_LOG("Alias %u is neither a host name nor an IP address", i + 1);
+  const std::vector<const char*> items = ListItems(names.get());
+  for (size_t i = 0; i < items.size(); ++i) {
+    if (!IsAllowedAlias(items[i])) {
+      ORVA_LOG("Alias %zu is neither a host name nor an IP address", i + 1);
       return -1;
     }
   }

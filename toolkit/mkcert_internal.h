@@ -5,6 +5,7 @@
 
 #include <cstddef>
 #include <string>
+#include <vector>
 
 #include "common/store_paths.h"
 #include "platform/olib/olib_szlist.h"
@@ -26,8 +27,15 @@ inline bool ToolExitedCleanly(int status) {
   return status != -1 && WIFEXITED(status) && WEXITSTATUS(status) == 0;
 }
 
+// A certificate carries at most this many alias names.
+inline constexpr size_t kMaxAliases = 100;
+
 // The names of the ";"-separated `aliases`, in order, empty ones kept.
-// Null (logged) when the list cannot be made or split.
+// Null (logged) when there are more than kMaxAliases non-empty names or
+// the list cannot be made or split.
 OLIBSzListPtr SplitAliases(const char* aliases);
+
+// The items of `list` in order, read in one pass.
+std::vector<const char*> ListItems(const OLIBSZLIST* list);
 
 #endif  // ORVA_TOOLKIT_MKCERT_INTERNAL_H_

@@ -2,6 +2,7 @@
 // certificates signed by the local CA.
 
 #include <cerrno>
+#include <cstring>
 #include <string>
 
 #include "common/file_util.h"
@@ -27,6 +28,14 @@ int WriteServerExtensions(const char* extFile, const char* aliases) {
 }  // namespace
 
 OLIBSzListPtr SplitAliases(const char* aliases) {
+  size_t names = 0;
+  for (const char* p = aliases; *p != '\0'; ++p) {
+    if (*p != ';' && (p == aliases || p[-1] == ';')) ++names;
+  }
+  if (names > kMaxAliases) {
+    ORVA_LOG("Too many alias names: %zu (at most %zu)", names, kMaxAliases);
+    return nullptr;
+  }
   OLIBSZLIST* list = OLIBCSzListAlloc(512);
   if (list == nullptr) {
     ORVA_LOG("Out of memory!! size=512");
@@ -40,6 +49,16 @@ OLIBSzListPtr SplitAliases(const char* aliases) {
     return nullptr;
   }
   return owner;
+}
+
+std::vector<const char*> ListItems(const OLIBSZLIST* list) {
+  std::vector<const char*> items;
+  const char* item = list->data;
+  for (uint32_t i = 0; i < list->nItem; ++i) {
+    items.push_back(item);
+    item += std::strlen(item) + 1;
+  }
+  return items;
 }
 
 int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,

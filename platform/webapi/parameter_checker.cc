@@ -1,8 +1,6 @@
 #include "platform/webapi/parameter_checker.h"
 
-#include <cerrno>
 #include <climits>
-#include <cstdlib>
 #include <memory>
 #include <string>
 
@@ -33,12 +31,18 @@ bool ParseJsonArray(const std::string& text, Json::Value* array) {
 }
 
 bool ParseWholeNumber(const std::string& text, int* number) {
-  size_t digits_start = (!text.empty() && text[0] == '-') ? 1 : 0;
-  if (text.size() == digits_start || text.size() > 12) return false;
+  const bool negative = !text.empty() && text[0] == '-';
+  const size_t digits_start = negative ? 1 : 0;
+  if (text.size() == digits_start) return false;
+  // The value decides, not the length: leading zeros are allowed, and the
+  // sum stops as soon as it leaves the 32-bit range.
+  long long value = 0;
   for (size_t i = digits_start; i < text.size(); ++i) {
     if (text[i] < '0' || text[i] > '9') return false;
+    value = value * 10 + (text[i] - '0');
+    if (value > static_cast<long long>(INT_MAX) + 1) return false;
   }
-  long long value = std::strtoll(text.c_str(), nullptr, 10);
+  if (negative) value = -value;
   if (value < INT_MIN || value > INT_MAX) return false;
   *number = static_cast<int>(value);
   return true;
