@@ -1,0 +1,212 @@
+// Faults while the store is written, one table per kind across the
+// writers: openssl failing at any run, the archiver failing, the disk full
+// at any run or copy, and store folders that are read-only or plain files.
+// Every row proves the answer and the store whole afterwards.
+
+#include <unistd.h>
+
+#include <map>
+#include <stdexcept>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "tests/faults/fault_support.h"
+#include "tests/support/method_calls.h"
+#include "tests/support/store_state.h"
+
+namespace {
+
+using Outcome = ORVA::APIResponse::Outcome;
+
+// The keys, certificates and requests a failed call keeps. CRT create
+// installs the new CA before it makes the server pair, so a later failure
+// keeps the new CA, which ExpectStoreWhole proves whole and matching.
+std::map<std::string, std::string> KeptFiles(const std::string& writer, const StoreState& state) {
+  std::map<std::string, std::string> files = CertificateFiles(state);
+  if (writer == "CRT create") {
+    for (const char* ca : {"ssl.key/ca.key", "ssl.crt/ca.crt", "ssl.csr/ca.csr"}) files.erase(ca);
+  }
+  return files;
+}
+
+// What every row proves once `writer` gave `response` with a fault in
+// place: the answer (`mayPass`: or a success, for a fault that may hit a
+// run that writes nothing), the store whole, and every file kept after a
+// failure.
+void ExpectFaultHandled(const TempDeviceRoot& root, const StoreState& before,
+                        const StoreWriter& writer, const ORVA::APIResponse& response,
+                        int answer, bool mayPass = false) {
+  if (!mayPass || response.outcome() != Outcome::kSuccess) {
+    EXPECT_EQ(answer, response.error_code());
+  }
+  ExpectStoreWhole(root, before);
+  if (response.outcome() != Outcome::kSuccess) {
+    EXPECT_EQ(KeptFiles(writer.name, before), KeptFiles(writer.name, ReadStore(root)));
+  }
+}
+
+// An export that failed sent nothing, left no archive and handed no set out.
+void ExpectExportSentNothing(const TempDeviceRoot& root, const StoreState& before,
+                             const MethodAnswer& answer) {
+  EXPECT_FALSE(answer.download.has_body);
+  EXPECT_TRUE(answer.response.output_enabled());
+  EXPECT_EQ(Outcome::kNone, answer.response.outcome());
+  EXPECT_FALSE(FileExists(root.Path(std::string(kStore) + "/.gen/archive.zip")));
+  EXPECT_EQ(CertificateFiles(before), CertificateFiles(ReadStore(root)));
+}
+
+StoreWriter Writer(const std::string& name) {
+  for (const StoreWriter& writer : StoreWriters()) {
+    if (writer.name == name) return writer;
+  }
+  throw std::invalid_argument("no store writer " + name);
+}
+
+const char* const kExportSets[] = {"archive", "csr_set", "signed_set"};
+
+}  // namespace
+
+class StoreFaults : public testing::Test {
+ protected:
+  void SetUp() override {
+    ASSERT_NO_FATAL_FAILURE(InstallOldStore(root_));
+    before_ = ReadStore(root_);
+  }
+
+  // How many times `writer` runs openssl when nothing fails.
+  int CountToolRuns(const StoreWriter& writer) {
+    InstallFaultyOpenssl(root_, ToolFault{});
+    writer.call(root_);
+    RestoreStore(root_, before_);
+    return ToolRuns(root_);
+  }
+
+  TempDeviceRoot root_;
+  StoreState before_;
+};
+
+// The store on a small tmpfs of its own, for the faults that need mounts.
+class MountedStoreFaults : public StoreFaults {
+ protected:
+  void SetUp() override {
+    std::string why;
+    if (!TestMounts::Available(&why)) GTEST_SKIP() << "no mounts for the store: " << why;
+    ASSERT_TRUE(mounts_.Tmpfs(root_.Path(kStore), 4 << 20));
+    StoreFaults::SetUp();
+  }
+
+  TestMounts mounts_;  // Declared after the device root: unmounted first.
+};
+
+TEST_F(StoreFaults, OpensslFailingAtAnyRunAnswersAndLeavesTheStoreWhole) {
+  std::vector<StoreWriter> writers = StoreWriters();
+  writers.push_back({"import of another pair's key",
+                     [](const TempDeviceRoot& root) {
+                       return CallImport(root.Path("/outside/server.crt"),
+                                         root.Path("/outside/request.key"),
+                                         root.Path("/outside/server-ca.crt"));
+                     },
+                     5514, 5514});
+  for (const StoreWriter& writer : writers) {
+    const int runs = CountToolRuns(writer);
+    ASSERT_GT(runs, 0) << writer.name;
+    for (int failing = 1; failing <= runs; ++failing) {
+      SCOPED_TRACE(std::string(writer.name) + ", openssl run " + std::to_string(failing) +
+                   " of " + std::to_string(runs) + " fails");
+      InstallFaultyOpenssl(root_, ToolFault{failing, 0});
+      ExpectFaultHandled(root_, before_, writer, writer.call(root_), writer.tool_failure);
+      if (writer.tool_failure == 5501) {
+        EXPECT_EQ(failing, ToolRuns(root_)) << "a run after the failure";
+      }
+      RestoreStore(root_, before_);
+    }
+  }
+}
+
+TEST_F(StoreFaults, FailingArchiverSendsNothingAndHandsNoSetOut) {
+  root_.WriteScript("/usr/orva/bin/7z", "exit 2");
+  for (const char* set : kExportSets) {
+    SCOPED_TRACE(set);
+    LogCapture log;
+    ExpectExportSentNothing(root_, before_, CallExport(set));
+    EXPECT_TRUE(log.Contains(" 7z file failed[0x") && log.Contains(" Create archive failed[0x"))
+        << log.Text();
+  }
+}
+
+TEST_F(MountedStoreFaults, DiskFullAtAnyOpensslRunOrCopyLeavesTheStoreWhole) {
+  for (const StoreWriter& writer : StoreWriters()) {
+    const int runs = CountToolRuns(writer);
+    for (int full = 1; full <= runs; ++full) {
+      SCOPED_TRACE(std::string(writer.name) + ", disk full from openssl run " +
+                   std::to_string(full) + " of " + std::to_string(runs));
+      InstallFaultyOpenssl(root_, ToolFault{0, full});
+      const ORVA::APIResponse response = writer.call(root_);
+      FreeDisk(root_);
+      ExpectFaultHandled(root_, before_, writer, response, writer.write_error, true);
+      RestoreStore(root_, before_);
+    }
+  }
+  // The import copies its three uploads after openssl's checks, each into
+  // one page, so room for `copied` pages fills the disk at the next copy.
+  InstallFaultyOpenssl(root_, ToolFault{});
+  const StoreWriter import = Writer("import");
+  for (int copied = 0; copied <= 3; ++copied) {
+    SCOPED_TRACE("room for " + std::to_string(copied) + " copies");
+    ASSERT_NO_FATAL_FAILURE(FillDisk(root_, copied * sysconf(_SC_PAGESIZE)));
+    const ORVA::APIResponse response = import.call(root_);
+    FreeDisk(root_);
+    ExpectFaultHandled(root_, before_, import, response, copied < 3 ? 5515 : 0);
+    RestoreStore(root_, before_);
+  }
+  for (const char* set : kExportSets) {
+    SCOPED_TRACE(std::string("export of ") + set + " on a full disk");
+    ASSERT_NO_FATAL_FAILURE(FillDisk(root_));
+    const MethodAnswer answer = CallExport(set);
+    FreeDisk(root_);
+    ExpectExportSentNothing(root_, before_, answer);
+  }
+}
+
+// Root writes through modes, so a read-only bind mount makes a folder
+// unwritable ("" is the store itself).
+TEST_F(MountedStoreFaults, ReadOnlyStoreOrFolderFailsItsWriters) {
+  std::vector<std::pair<std::string, StoreWriter>> cases;
+  for (const StoreWriter& writer : StoreWriters()) cases.push_back({"", writer});
+  for (const char* folder : {"ssl.key", "ssl.crt", "ssl.csr", "cfg.d", ".gen"}) {
+    cases.push_back({folder, Writer("CRT create")});  // It writes in all of them.
+  }
+  for (const auto& [folder, writer] : cases) {
+    SCOPED_TRACE(std::string(writer.name) + " with " + (folder.empty() ? "the store" : folder) +
+                 " read-only");
+    {
+      TestMounts readOnly;
+      ASSERT_TRUE(readOnly.ReadOnly(root_.Path(kStore) + "/" + folder));
+      ExpectFaultHandled(root_, before_, writer, writer.call(root_), writer.write_error);
+    }
+    RestoreStore(root_, before_);
+  }
+}
+
+TEST_F(StoreFaults, FileInPlaceOfAFolderFailsItsWriters) {
+  const std::pair<const char*, const char*> cases[] = {
+      {".gen", "CSR create"}, {".gen", "CSR renew"}, {".gen", "CSR sign"},
+      {"ssl.key", "CRT create"}, {"ssl.crt", "CRT create"}, {"cfg.d", "CSR create"},
+      {"ssl.intercrt", "import"},  // after the certificate and key are staged
+  };
+  for (const auto& [folder, name] : cases) {
+    SCOPED_TRACE(std::string(name) + " with a file at " + folder);
+    StoreState state;
+    for (const auto& [path, file] : before_) {
+      if (path.rfind(std::string(folder) + "/", 0) != 0) state[path] = file;
+    }
+    state[folder] = {"not a folder\n", 0644};
+    RestoreStore(root_, state);
+    const StoreWriter writer = Writer(name);
+    ExpectFaultHandled(root_, state, writer, writer.call(root_), writer.write_error);
+    EXPECT_EQ("not a folder\n", ReadFile(root_.Path(std::string(kStore) + "/" + folder)));
+  }
+}
