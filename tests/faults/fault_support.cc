@@ -93,19 +93,19 @@ bool TestMounts::ReadOnly(const std::string& path) {
   return mount("none", path.c_str(), "none", MS_REMOUNT | MS_BIND | MS_RDONLY, nullptr) == 0;
 }
 
-std::vector<StoreWriter> StoreWriters() {
+std::map<std::string, StoreWriter> StoreWriters() {
   return {
-      {"CSR create", [](const TempDeviceRoot&) { return CallCreateCsr(); }, 5501, 5501},
-      {"CSR renew", [](const TempDeviceRoot&) { return CallRenew(); }, 5501, 5501},
+      {"CSR create", {[](const TempDeviceRoot&) { return CallCreateCsr(); }, 5501, 5501}},
+      {"CSR renew", {[](const TempDeviceRoot&) { return CallRenew(); }, 5501, 5501}},
       {"CSR sign",
-       [](const TempDeviceRoot& root) { return CallSign(root.Path("/outside/request.csr")); },
-       5501, 5501},
-      {"CRT create", [](const TempDeviceRoot&) { return CallCreateCrt(); }, 5501, 5501},
+       {[](const TempDeviceRoot& root) { return CallSign(root.Path("/outside/request.csr")); },
+        5501, 5501}},
+      {"CRT create", {[](const TempDeviceRoot&) { return CallCreateCrt(); }, 5501, 5501}},
       {"import",
-       [](const TempDeviceRoot& root) {
-         return CallImport(root.Path("/outside/server.crt"), root.Path("/outside/server.key"),
-                           root.Path("/outside/server-ca.crt"));
-       },
-       5515, 0},
+       {[](const TempDeviceRoot& root) {
+          return CallImport(root.Path("/outside/server.crt"), root.Path("/outside/server.key"),
+                            root.Path("/outside/server-ca.crt"));
+        },
+        5515, 0}},
   };
 }

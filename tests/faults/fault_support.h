@@ -1,7 +1,10 @@
 #ifndef ORVA_TESTS_FAULTS_FAULT_SUPPORT_H_
 #define ORVA_TESTS_FAULTS_FAULT_SUPPORT_H_
 
+#include <sys/types.h>
+
 #include <functional>
+#include <map>
 #include <string>
 #include <vector>
 
@@ -50,17 +53,17 @@ class TestMounts {
   std::vector<std::string> mounted_;
 };
 
-// A method that writes the store, for tables of cases. Each works on the
+// A method that writes the store, for tables of cases, working on the
 // store and the files outside it that InstallOldStore made.
 struct StoreWriter {
-  const char* name;
   std::function<ORVA::APIResponse(const TempDeviceRoot&)> call;
   int write_error;   // its answer when the store cannot be written
   int tool_failure;  // its answer when an openssl run fails (0: success)
 };
-// CSR create, renew, sign (of the request outside the store), CRT create,
-// and the import of the server set outside the store, which runs openssl
-// only to compare the pair and lets the library decide when it fails.
-std::vector<StoreWriter> StoreWriters();
+// By name: "CSR create", "CSR renew", "CSR sign" (of the request outside the
+// store), "CRT create", and "import" of the server set outside the store,
+// which runs openssl only to compare the pair and lets the library decide
+// when it fails.
+std::map<std::string, StoreWriter> StoreWriters();
 
 #endif  // ORVA_TESTS_FAULTS_FAULT_SUPPORT_H_

@@ -6,7 +6,6 @@
 #include <unistd.h>
 
 #include <map>
-#include <stdexcept>
 #include <string>
 #include <utility>
 #include <vector>
@@ -32,19 +31,19 @@ std::map<std::string, std::string> KeptFiles(const std::string& writer, const St
   return files;
 }
 
-// What every row proves once `writer` gave `response` with a fault in
-// place: the answer (`mayPass`: or a success, for a fault that may hit a
-// run that writes nothing), the store whole, and every file kept after a
-// failure.
+// What every row proves once the writer `name` gave `response` with a
+// fault in place: the answer (`mayPass`: or a success, for a fault that may
+// hit a run that writes nothing), the store whole, and every file kept
+// after a failure.
 void ExpectFaultHandled(const TempDeviceRoot& root, const StoreState& before,
-                        const StoreWriter& writer, const ORVA::APIResponse& response,
+                        const std::string& name, const ORVA::APIResponse& response,
                         int answer, bool mayPass = false) {
   if (!mayPass || response.outcome() != Outcome::kSuccess) {
     EXPECT_EQ(answer, response.error_code());
   }
   ExpectStoreWhole(root, before);
   if (response.outcome() != Outcome::kSuccess) {
-    EXPECT_EQ(KeptFiles(writer.name, before), KeptFiles(writer.name, ReadStore(root)));
+    EXPECT_EQ(KeptFiles(name, before), KeptFiles(name, ReadStore(root)));
   }
 }
 
@@ -56,13 +55,6 @@ void ExpectExportSentNothing(const TempDeviceRoot& root, const StoreState& befor
   EXPECT_EQ(Outcome::kNone, answer.response.outcome());
   EXPECT_FALSE(FileExists(root.Path(std::string(kStore) + "/.gen/archive.zip")));
   EXPECT_EQ(CertificateFiles(before), CertificateFiles(ReadStore(root)));
-}
-
-StoreWriter Writer(const std::string& name) {
-  for (const StoreWriter& writer : StoreWriters()) {
-    if (writer.name == name) return writer;
-  }
-  throw std::invalid_argument("no store writer " + name);
 }
 
 const char* const kExportSets[] = {"archive", "csr_set", "signed_set"};
@@ -102,22 +94,21 @@ class MountedStoreFaults : public StoreFaults {
 };
 
 TEST_F(StoreFaults, OpensslFailingAtAnyRunAnswersAndLeavesTheStoreWhole) {
-  std::vector<StoreWriter> writers = StoreWriters();
-  writers.push_back({"import of another pair's key",
-                     [](const TempDeviceRoot& root) {
-                       return CallImport(root.Path("/outside/server.crt"),
-                                         root.Path("/outside/request.key"),
-                                         root.Path("/outside/server-ca.crt"));
-                     },
-                     5514, 5514});
-  for (const StoreWriter& writer : writers) {
+  std::map<std::string, StoreWriter> writers = StoreWriters();
+  writers["import of another pair's key"] = {[](const TempDeviceRoot& root) {
+                                               return CallImport(root.Path("/outside/server.crt"),
+                                                                 root.Path("/outside/request.key"),
+                                                                 root.Path("/outside/server-ca.crt"));
+                                             },
+                                             5514, 5514};
+  for (const auto& [name, writer] : writers) {
     const int runs = CountToolRuns(writer);
-    ASSERT_GT(runs, 0) << writer.name;
+    ASSERT_GT(runs, 0) << name;
     for (int failing = 1; failing <= runs; ++failing) {
-      SCOPED_TRACE(std::string(writer.name) + ", openssl run " + std::to_string(failing) +
-                   " of " + std::to_string(runs) + " fails");
+      SCOPED_TRACE(name + ", openssl run " + std::to_string(failing) + " of " +
+                   std::to_string(runs) + " fails");
       InstallFaultyOpenssl(root_, ToolFault{failing, 0});
-      ExpectFaultHandled(root_, before_, writer, writer.call(root_), writer.tool_failure);
+      ExpectFaultHandled(root_, before_, name, writer.call(root_), writer.tool_failure);
       if (writer.tool_failure == 5501) {
         EXPECT_EQ(failing, ToolRuns(root_)) << "a run after the failure";
       }
@@ -138,28 +129,27 @@ TEST_F(StoreFaults, FailingArchiverSendsNothingAndHandsNoSetOut) {
 }
 
 TEST_F(MountedStoreFaults, DiskFullAtAnyOpensslRunOrCopyLeavesTheStoreWhole) {
-  for (const StoreWriter& writer : StoreWriters()) {
+  for (const auto& [name, writer] : StoreWriters()) {
     const int runs = CountToolRuns(writer);
     for (int full = 1; full <= runs; ++full) {
-      SCOPED_TRACE(std::string(writer.name) + ", disk full from openssl run " +
-                   std::to_string(full) + " of " + std::to_string(runs));
+      SCOPED_TRACE(name + ", disk full from openssl run " + std::to_string(full) + " of " +
+                   std::to_string(runs));
       InstallFaultyOpenssl(root_, ToolFault{0, full});
       const ORVA::APIResponse response = writer.call(root_);
       FreeDisk(root_);
-      ExpectFaultHandled(root_, before_, writer, response, writer.write_error, true);
+      ExpectFaultHandled(root_, before_, name, response, writer.write_error, true);
       RestoreStore(root_, before_);
     }
   }
   // The import copies its three uploads after openssl's checks, each into
   // one page, so room for `copied` pages fills the disk at the next copy.
   InstallFaultyOpenssl(root_, ToolFault{});
-  const StoreWriter import = Writer("import");
   for (int copied = 0; copied <= 3; ++copied) {
     SCOPED_TRACE("room for " + std::to_string(copied) + " copies");
     ASSERT_NO_FATAL_FAILURE(FillDisk(root_, copied * sysconf(_SC_PAGESIZE)));
-    const ORVA::APIResponse response = import.call(root_);
+    const ORVA::APIResponse response = StoreWriters().at("import").call(root_);
     FreeDisk(root_);
-    ExpectFaultHandled(root_, before_, import, response, copied < 3 ? 5515 : 0);
+    ExpectFaultHandled(root_, before_, "import", response, copied < 3 ? 5515 : 0);
     RestoreStore(root_, before_);
   }
   for (const char* set : kExportSets) {
@@ -174,18 +164,25 @@ TEST_F(MountedStoreFaults, DiskFullAtAnyOpensslRunOrCopyLeavesTheStoreWhole) {
 // Root writes through modes, so a read-only bind mount makes a folder
 // unwritable ("" is the store itself).
 TEST_F(MountedStoreFaults, ReadOnlyStoreOrFolderFailsItsWriters) {
-  std::vector<std::pair<std::string, StoreWriter>> cases;
-  for (const StoreWriter& writer : StoreWriters()) cases.push_back({"", writer});
-  for (const char* folder : {"ssl.key", "ssl.crt", "ssl.csr", "cfg.d", ".gen"}) {
-    cases.push_back({folder, Writer("CRT create")});  // It writes in all of them.
+  const std::map<std::string, StoreWriter> writers = StoreWriters();
+  std::vector<std::pair<std::string, std::string>> cases;  // folder, writer
+  for (const auto& [name, writer] : writers) cases.push_back({"", name});
+  for (const char* folder : {"ssl.key", "ssl.crt", "ssl.csr", "cfg.d", ".gen", "ssl.intercrt"}) {
+    cases.push_back({folder, "CRT create"});  // It writes in all of them.
   }
-  for (const auto& [folder, writer] : cases) {
-    SCOPED_TRACE(std::string(writer.name) + " with " + (folder.empty() ? "the store" : folder) +
-                 " read-only");
+  for (const auto& [folder, name] : cases) {
+    SCOPED_TRACE(name + " with " + (folder.empty() ? "the store" : folder) + " read-only");
     {
       TestMounts readOnly;
       ASSERT_TRUE(readOnly.ReadOnly(root_.Path(kStore) + "/" + folder));
-      ExpectFaultHandled(root_, before_, writer, writer.call(root_), writer.write_error);
+      const ORVA::APIResponse response = writers.at(name).call(root_);
+      // The old intermediate goes after the new pair is in place.
+      if (folder == "ssl.intercrt") {
+        EXPECT_EQ(5501, response.error_code());
+        ExpectStoreWhole(root_, before_);
+      } else {
+        ExpectFaultHandled(root_, before_, name, response, writers.at(name).write_error);
+      }
     }
     RestoreStore(root_, before_);
   }
@@ -205,8 +202,8 @@ TEST_F(StoreFaults, FileInPlaceOfAFolderFailsItsWriters) {
     }
     state[folder] = {"not a folder\n", 0644};
     RestoreStore(root_, state);
-    const StoreWriter writer = Writer(name);
-    ExpectFaultHandled(root_, state, writer, writer.call(root_), writer.write_error);
+    const StoreWriter writer = StoreWriters().at(name);
+    ExpectFaultHandled(root_, state, name, writer.call(root_), writer.write_error);
     EXPECT_EQ("not a folder\n", ReadFile(root_.Path(std::string(kStore) + "/" + folder)));
   }
 }
