@@ -1,22 +1,17 @@
-// Fuzz target: a /webapi request read by the HTTP server's own code (request
-// line and query string, urlencoded or multipart body) and turned into a
-// call by ParseWebapiRequest, uploads saved in a private upload folder.
+// Fuzz target: a raw /webapi request read by the HTTP server's own code and
+// turned into a call by ParseWebapiRequest, uploads saved in a private folder.
 //
-// Input: one byte of options, a line (up to the first '\n', which is
-// dropped) that is the query string, then:
-//   options & 3 == 0  GET /webapi?QUERY; the rest is ignored
-//   options & 3 == 1  POST /webapi?QUERY with the rest as an urlencoded form
-//   options & 3 == 2  POST /webapi?QUERY with a multipart form: a second line
-//                     is its boundary, the rest the body
-//   options & 3 == 3  as 2, but the second line is the whole Content-Type
-// options >> 2, when not 0, is the most bytes one read gets, as when a
-// client's request arrives in small pieces; 0 gives all it asks for.
+// Input: one byte of options, then the query string up to the first '\n'.
+// options & 3: 0 GET; 1 POST with the rest as an urlencoded form; 2 POST
+// with a multipart form whose boundary is the next line; 3 as 2, the next
+// line being the whole Content-Type. options >> 2, when not 0, is the most
+// bytes one read gets, as when a request arrives in small pieces.
 //
 // Beyond crashes it checks what the host promises whatever the client
-// sends: every "N_tmp" of an accepted call is the host's copy of the upload
-// N, a private file directly in the upload folder holding exactly the
-// part's content, so no "_tmp" text of the client gets through; a refused
-// call (400) saves nothing; and nothing is left once the call is over.
+// sends: every "N_tmp" of an accepted call is the host's private copy
+// (0600, directly in the upload folder) of exactly the content of upload
+// N, so no "_tmp" text of the client gets through; a refused call (400)
+// saves nothing; and nothing is left once the call is over.
 
 #include <httplib.h>
 #include <sys/stat.h>
