@@ -3,56 +3,35 @@
 // replayed by each build's tests. A folder that is missing or empty fails:
 // a corpus must not vanish unnoticed.
 
-#include <dirent.h>
-
-#include <algorithm>
 #include <cstdint>
 #include <cstdio>
+#include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <set>
 #include <string>
 #include <vector>
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size);
 
-namespace {
-
-bool ListFiles(const std::string& folder, std::vector<std::string>* files) {
-  DIR* directory = opendir(folder.c_str());
-  if (directory == nullptr) return false;
-  while (struct dirent* entry = readdir(directory)) {
-    if (entry->d_name[0] == '.') continue;
-    files->push_back(folder + "/" + entry->d_name);
-  }
-  closedir(directory);
-  std::sort(files->begin(), files->end());
-  return true;
-}
-
-}  // namespace
-
 int main(int argc, char** argv) {
-  if (argc < 2) {
-    std::fprintf(stderr, "usage: %s CORPUS_FOLDER...\n", argv[0]);
-    return 2;
-  }
   for (int i = 1; i < argc; ++i) {
-    std::vector<std::string> files;
-    if (!ListFiles(argv[i], &files) || files.empty()) {
-      std::fprintf(stderr, "%s: no corpus files in %s\n", argv[0], argv[i]);
-      return 1;
+    std::set<std::filesystem::path> files;  // In order, so a failing run repeats.
+    std::error_code error;
+    for (const auto& entry : std::filesystem::directory_iterator(argv[i], error)) {
+      if (entry.path().filename().string()[0] != '.') files.insert(entry.path());
     }
-    for (const std::string& file : files) {
+    for (const std::filesystem::path& file : files) {
       std::ifstream stream(file, std::ios::binary);
-      std::vector<uint8_t> input((std::istreambuf_iterator<char>(stream)),
-                                 std::istreambuf_iterator<char>());
-      if (!stream.eof() && stream.fail()) {
+      const std::vector<uint8_t> input((std::istreambuf_iterator<char>(stream)), {});
+      if (!stream) {
         std::fprintf(stderr, "%s: cannot read %s\n", argv[0], file.c_str());
         return 1;
       }
       LLVMFuzzerTestOneInput(input.data(), input.size());
     }
     std::printf("%s: %zu inputs of %s ran\n", argv[0], files.size(), argv[i]);
+    if (files.empty()) return 1;
   }
-  return 0;
+  return argc < 2 ? 2 : 0;
 }

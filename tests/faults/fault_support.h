@@ -9,16 +9,14 @@
 #include <vector>
 
 #include "platform/webapi/api_response.h"
-#include "tests/support/method_calls.h"
-#include "tests/support/store_state.h"
 #include "tests/support/test_support.h"
 
-// Fault injection around the certificate store: a failing openssl, a full
-// disk, folders that cannot be written, and the checks that prove what the
-// store holds afterwards.
+// Faults injected around the certificate store: an openssl that fails or
+// fills the disk at a chosen run, a full disk, and mounts that make store
+// folders small or read-only.
 
-// Replaces the device's openssl with a script that counts its runs in a file
-// of the device root and passes everything else to the machine's tool.
+// Replaces the device's openssl with a script that counts its runs in a
+// file of the device root and otherwise runs the machine's tool.
 struct ToolFault {
   int fail_run = 0;       // this run (from 1) exits with 1 instead
   int fill_disk_run = 0;  // before this run the store's disk is filled up
@@ -26,15 +24,16 @@ struct ToolFault {
 void InstallFaultyOpenssl(const TempDeviceRoot& root, const ToolFault& fault);
 // Runs counted since the script was installed.
 int ToolRuns(const TempDeviceRoot& root);
-// Fills the store's disk up (at most 16 MiB, so a store that is not on a
-// small disk never fills the machine's), then gives `room` bytes back;
-// FreeDisk removes the filler.
+
+// Fills the store's disk up, then gives `room` bytes back. The filler is a
+// hidden store file, at most 16 MiB so that a store not on a small disk
+// never fills the machine's; FreeDisk removes it.
 void FillDisk(const TempDeviceRoot& root, off_t room = 0);
 void FreeDisk(const TempDeviceRoot& root);
 
-// Mounts made for one test, undone by the destructor in reverse order. They
-// live in a mount namespace of the test process, made on first use, so
-// nothing outside the process sees them and a crash leaves none behind.
+// Mounts of one test, undone by the destructor in reverse order. They live
+// in a mount namespace of the test process, made on first use, so nothing
+// outside the process sees them and a crash leaves none behind.
 class TestMounts {
  public:
   TestMounts() = default;
@@ -42,9 +41,10 @@ class TestMounts {
   TestMounts(const TestMounts&) = delete;
   TestMounts& operator=(const TestMounts&) = delete;
 
-  // True when this process may mount; otherwise `why` says why not.
+  // True when this process may mount (root with mount rights); otherwise
+  // `why` says why not.
   static bool Available(std::string* why);
-  // A tmpfs of `bytes` on the folder `path`. False (with errno) on failure.
+  // A tmpfs of `bytes` on the folder `path`. False on failure.
   bool Tmpfs(const std::string& path, size_t bytes);
   // `path` bound onto itself, read-only. False on failure.
   bool ReadOnly(const std::string& path);
@@ -53,19 +53,17 @@ class TestMounts {
   std::vector<std::string> mounted_;
 };
 
-// A method that writes the store, by name, for tables of cases.
+// A method that writes the store, for tables of cases, working on the
+// store and the files outside it that InstallOldStore made.
 struct StoreWriter {
-  const char* name;
   std::function<ORVA::APIResponse(const TempDeviceRoot&)> call;
-  int write_error = 5501;  // its answer when the store cannot be written
+  int write_error;   // its answer when the store cannot be written
+  int tool_failure;  // its answer when an openssl run fails (0: success)
 };
-// CSR create, renew, sign (of a request kept outside the store) and CRT
-// create: the writers that make their files with openssl.
-std::vector<StoreWriter> StoreWriters();
-// The import of the server set InstallOldStore made outside the store. It copies
-// files into the store and runs openssl only to compare the pair.
-StoreWriter ImportWriter();
-// StoreWriters() and ImportWriter().
-std::vector<StoreWriter> StoreWritersAndImport();
+// By name: "CSR create", "CSR renew", "CSR sign" (of the request outside the
+// store), "CRT create", and "import" of the server set outside the store,
+// which runs openssl only to compare the pair and lets the library decide
+// when it fails.
+std::map<std::string, StoreWriter> StoreWriters();
 
 #endif  // ORVA_TESTS_FAULTS_FAULT_SUPPORT_H_

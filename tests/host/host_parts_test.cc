@@ -1,7 +1,12 @@
-// The host's parts whose edge cases a running server cannot reach cheaply.
+// The host's parts whose order a running server shows only by timing: the
+// order of calls, and when the HTTPS listener reads the store.
 
-#include <chrono>
-#include <memory>
+#include <sys/syscall.h>
+#include <unistd.h>
+
+#include <filesystem>
+#include <future>
+#include <map>
 #include <mutex>
 #include <string>
 #include <thread>
@@ -9,146 +14,101 @@
 
 #include <gtest/gtest.h>
 
-#include "host/access_token.h"
-#include "host/api_call.h"
 #include "host/call_order.h"
-#include "host/listen_address.h"
-#include "host/request_parsing.h"
-#include "host/temporary_uploads.h"
-#include "tests/support/test_support.h"
+#include "host/https_listener.h"
+#include "tests/host/serve_process.h"
+#include "tests/support/certificates.h"
 
-TEST(ListenAddress, ParsesHostAndPortAndRefusesAnythingElse) {
-  struct Case {
-    const char* text;
-    const char* host;  // null when refused
-    int port;
-  } cases[] = {
-      {"127.0.0.1:8080", "127.0.0.1", 8080}, {"[::1]:65535", "::1", 65535},
-      {"localhost:65536", nullptr, 0},       {"localhost:80a", nullptr, 0},
-      {"localhost:", nullptr, 0},            {"::1:8080", nullptr, 0},
-  };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.text);
-    ListenAddress address{"unchanged", 7};
-    ASSERT_EQ(c.host != nullptr, ParseListenAddress(c.text, &address));
-    EXPECT_EQ(c.host != nullptr ? c.host : "unchanged", address.host);
-    EXPECT_EQ(c.host != nullptr ? c.port : 7, address.port);
-  }
-  EXPECT_EQ("https://[::1]:8443/", ListenUrl("https", "::1", 8443, "/"));
+namespace {
+
+// Waits until every other thread of this process sleeps, so that the
+// threads a test started have come as far as they can.
+bool OtherThreadsSleep() {
+  return WaitFor([] {
+    const std::string self = std::to_string(syscall(SYS_gettid));
+    std::error_code error;
+    for (std::filesystem::directory_iterator task("/proc/self/task", error), end;
+         !error && task != end; task.increment(error)) {
+      const std::string stat = ReadFile(task->path().string() + "/stat");
+      const std::string::size_type state = stat.rfind(") ") + 2;
+      if (task->path().filename() != self && state < stat.size() && stat[state] != 'S') {
+        return false;
+      }
+    }
+    return !error;
+  });
 }
 
-TEST(AccessToken, AcceptsOnlyTheBearerOfTheExactToken) {
-  TempDeviceRoot scratch;
-  scratch.WriteFile("/token", "  0123abcd\n", 0600);
-  scratch.WriteFile("/empty", " \n", 0600);
-  AccessToken token;
-  std::string error;
-  ASSERT_TRUE(token.LoadFromFile(scratch.Path("/token"), &error)) << error;
-  for (const char* accepted : {"Bearer 0123abcd", "bearer 0123abcd", "BEARER 0123abcd"}) {
-    EXPECT_TRUE(token.Accepts(accepted)) << accepted;
-  }
-  for (const char* refused : {"", "Bearer ", "Bearer 0123abc", "Bearer 0123abcdd",
-                              "Bearer 0123ABCD", "Bearer  0123abcd", "Bearer 0123abcd ",
-                              "Basic 0123abcd", "0123abcd"}) {
-    EXPECT_FALSE(token.Accepts(refused)) << refused;
-  }
-
-  for (const char* file : {"/missing", "/empty"}) {
-    SCOPED_TRACE(file);
-    AccessToken none;
-    EXPECT_FALSE(none.LoadFromFile(scratch.Path(file), &error));
-    EXPECT_NE(std::string::npos, error.find(scratch.Path(file)));
-    EXPECT_FALSE(none.Accepts("Bearer ")) << "no token file accepts nothing";
-  }
-}
-
-TEST(RequestParsing, RefusesMalformedRequestsWith400) {
-  struct Case {
-    const char* what;
-    std::vector<std::pair<std::string, std::string>> params;
-    std::vector<httplib::MultipartFormData> parts;
-  } cases[] = {
-      {"no method", {{"api", "A"}}, {}},
-      {"version not a number", {{"api", "A"}, {"method", "m"}, {"version", "1x"}}, {}},
-      {"version too long", {{"api", "A"}, {"method", "m"}, {"version", "1234567890"}}, {}},
-      {"client names a file", {{"api", "A"}, {"method", "m"}, {"cert_tmp", "/etc/passwd"}}, {}},
-      {"client names a file in a form field", {{"api", "A"}, {"method", "m"}},
-       {{"key_tmp", "/etc/shadow", "", ""}}},
-      {"upload named like a host file", {{"api", "A"}, {"method", "m"}},
-       {{"cert_tmp", "x", "a.pem", ""}}},
-      {"upload named like the api", {{"api", "A"}, {"method", "m"}}, {{"api", "x", "a.pem", ""}}},
-      {"parameter given twice", {{"api", "A"}, {"method", "m"}, {"type", "a"}, {"type", "b"}}, {}},
-      {"query and form both", {{"api", "A"}, {"method", "m"}}, {{"api", "B", "", ""}}},
-      {"upload beside a field of its name", {{"api", "A"}, {"method", "m"}, {"cert", "x"}},
-       {{"cert", "x", "a.pem", ""}}},
-  };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.what);
-    httplib::Request request;
-    for (const auto& param : c.params) request.params.emplace(param.first, param.second);
-    for (const auto& part : c.parts) request.files.emplace(part.name, part);
-    TemporaryUploads uploads;
-    WebapiCall call;
-    EXPECT_EQ(400, ParseWebapiRequest(request, &uploads, &call));
-  }
-}
-
-TEST(OneLineJson, ReplacesEveryByteOutsideWellFormedUtf8) {
-  const std::string kReplacement = "\xEF\xBF\xBD";
-  struct Case {
-    const char* text;
-    std::string json;  // between the quotes
-  } cases[] = {
-      {"Z\xC3\xBCrich \xE2\x82\xAC \xF0\x9F\x98\x80", "Z\xC3\xBCrich \xE2\x82\xAC \xF0\x9F\x98\x80"},
-      {"caf\xE9!", "caf" + kReplacement + "!"},
-      {"a\xC3(b", "a" + kReplacement + "(b"},         // lead byte without its follower
-      {"\xC0\xAF", kReplacement + kReplacement},        // overlong "/"
-      {"\xED\xA0\x80", kReplacement + kReplacement + kReplacement},  // a surrogate
-      {"\xF4\x90\x80\x80", kReplacement + kReplacement + kReplacement + kReplacement},
-      {"end\xE2\x82", "end" + kReplacement + kReplacement},  // cut short
-      {"\x80\tq\"", kReplacement + "\\tq\\\""},
-  };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.text);
-    Json::Value object(Json::objectValue);
-    object["k"] = c.text;
-    EXPECT_EQ("{\"k\":\"" + c.json + "\"}", ToOneLineJson(object));
-  }
-}
+}  // namespace
 
 TEST(CallOrder, ListCallsShareTheLockAndEveryCallStartsInTheOrderItCame) {
-  CallOrder order;
-  std::vector<std::string> finished;
-  std::mutex finished_mutex;
-  auto record = [&](const char* who) {
-    std::lock_guard<std::mutex> lock(finished_mutex);
-    finished.push_back(who);
+  // Each step: a call arrives (with its api and method) or a running call
+  // ends; then the calls that start.
+  const struct {
+    const char* call;
+    const char* api;  // null: the call ends
+    const char* method;
+    const char* starting;
+  } steps[] = {
+      {"reader 1", "ORVA.Core.Certificate", "list", "reader 1 "},
+      {"reader 2", "ORVA.Core.Certificate", "list", "reader 2 "},
+      // Only the certificate list shares the lock: "list" of another api writes.
+      {"writer 1", "ORVA.Core.Certificate.CSR", "list", ""},
+      {"writer 2", "ORVA.Core.Certificate.CRT", "create", ""},
+      {"reader 3", "ORVA.Core.Certificate", "list", ""},
+      {"writer 3", "ORVA.Core.Certificate.CRT", "create", ""},
+      {"reader 1", nullptr, nullptr, ""},
+      {"reader 2", nullptr, nullptr, "writer 1 "},
+      {"writer 1", nullptr, nullptr, "writer 2 "},
+      {"writer 2", nullptr, nullptr, "reader 3 "},
+      {"reader 3", nullptr, nullptr, "writer 3 "},
+      {"writer 3", nullptr, nullptr, ""},
   };
-  auto first_reader = std::make_unique<CallOrder::Turn>(&order, "ORVA.Core.Certificate", "list");
-  { CallOrder::Turn second_reader(&order, "ORVA.Core.Certificate", "list"); }
-  // Only the certificate list shares the lock: "list" of another api writes.
-  std::thread writer([&] {
-    CallOrder::Turn turn(&order, "ORVA.Core.Certificate.CSR", "list");
-    record("writer");
-  });
-  std::this_thread::sleep_for(std::chrono::milliseconds(100));
-  std::thread late_reader([&] {
-    CallOrder::Turn turn(&order, "ORVA.Core.Certificate", "list");
-    record("late reader");
-  });
-  std::this_thread::sleep_for(std::chrono::milliseconds(100));
-  std::thread late_writer([&] {
-    CallOrder::Turn turn(&order, "ORVA.Core.Certificate.CRT", "create");
-    record("late writer");
-  });
-  std::this_thread::sleep_for(std::chrono::milliseconds(100));
-  record("first reader");
-  first_reader.reset();
-  writer.join();
-  late_reader.join();
-  late_writer.join();
-  // A waiting writer goes before later readers, and a reader waiting behind
-  // it goes before later writers: neither kind can hold the other off.
-  EXPECT_EQ((std::vector<std::string>{"first reader", "writer", "late reader", "late writer"}),
-            finished);
+  CallOrder order;
+  std::mutex started_mutex;
+  std::string started, expected;
+  std::map<std::string, std::promise<void>> ends;
+  std::vector<std::thread> calls;
+  for (const auto& step : steps) {
+    SCOPED_TRACE(std::string(step.api != nullptr ? "arrives: " : "ends: ") + step.call);
+    if (step.api == nullptr) {
+      ends[step.call].set_value();
+    } else {
+      calls.emplace_back([&, step, end = ends[step.call].get_future()] {
+        CallOrder::Turn turn(&order, step.api, step.method);
+        {
+          std::lock_guard<std::mutex> lock(started_mutex);
+          started += std::string(step.call) + " ";
+        }
+        end.wait();
+      });
+    }
+    // Every step runs, even after a failure, so that every call ends.
+    EXPECT_TRUE(OtherThreadsSleep());
+    expected += step.starting;
+    std::lock_guard<std::mutex> lock(started_mutex);
+    EXPECT_EQ(expected, started);
+  }
+  for (std::thread& call : calls) call.join();
+}
+
+TEST(HttpsListener, ReloadReadsTheStoreOnlyOnceTheChangeUnderWayIsDone) {
+  TempDeviceRoot scratch;
+  const std::string key = scratch.Path("/usr/orva/etc/ssl/ssl.key/server.key");
+  const std::string crt = scratch.Path("/usr/orva/etc/ssl/ssl.crt/server.crt");
+  scratch.WriteFile("/usr/orva/etc/orva.conf", "runHTTPS=\"yes\"\n");
+  ASSERT_TRUE(MakeSelfSignedCa(key, crt, "/CN=first.test"));
+  CallOrder order;
+  HttpsListener https({"127.0.0.1", 0}, [](httplib::Server*) {}, &order);
+  https.Start();
+  const int port = https.port();
+  ASSERT_EQ("CN = first.test\n", PresentedSubjects(port));
+  {
+    CallOrder::Turn changing(&order, false);
+    scratch.WriteFile("/usr/orva/etc/ssl/ssl.crt/server.crt", "half written\n");
+    https.RequestReload();
+    ASSERT_TRUE(OtherThreadsSleep());
+    ASSERT_TRUE(MakeSelfSignedCa(key, crt, "/CN=second.test"));
+  }
+  EXPECT_TRUE(WaitFor([&] { return PresentedSubjects(port) == "CN = second.test\n"; }));
 }

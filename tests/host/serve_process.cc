@@ -1,135 +1,107 @@
 #include "tests/host/serve_process.h"
 
 #include <arpa/inet.h>
-#include <netinet/in.h>
-#include <poll.h>
-#include <sys/socket.h>
 #include <fcntl.h>
+#include <poll.h>
 #include <signal.h>
 #include <sys/prctl.h>
+#include <sys/socket.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <chrono>
+#include <cstdio>
 #include <filesystem>
-#include <fstream>
 #include <memory>
 #include <sstream>
 #include <thread>
+#include <vector>
 
 #include "host/device_root_init.h"
-#include "tests/support/test_support.h"
 
-namespace {
-
-// The port of the line "LABEL URL" whose URL ends in ":PORT/", or 0.
-int PortOnLine(const std::string& output, const std::string& label) {
-  std::istringstream lines(output);
-  std::string line;
-  while (std::getline(lines, line)) {
-    if (line.rfind(label, 0) != 0 || line.size() < 2 || line.back() != '/') continue;
-    std::string::size_type colon = line.rfind(':');
-    if (colon == std::string::npos) return 0;
-    return std::atoi(line.substr(colon + 1).c_str());
-  }
-  return 0;
-}
-
-}  // namespace
-
-ServeProcess::ServeProcess(const std::string& root,
-                           const std::vector<std::string>& arguments)
-    : root_(root) {
+ServeProcess::ServeProcess(const std::string& root, const std::string& web) : root_(root) {
   MakeDirs(UploadFolder());
   // Uploads go where TMPDIR points; env sets it for the server alone.
   std::vector<std::string> words = {"/usr/bin/env", "TMPDIR=" + UploadFolder(),
                                     ORVA_WEBAPI_PATH, "serve", "--root", root,
                                     "--listen", "127.0.0.1:0", "--listen-https",
                                     "127.0.0.1:0", "--module", ORVA_TEST_MODULE_PATH};
-  words.insert(words.end(), arguments.begin(), arguments.end());
+  if (!web.empty()) words.insert(words.end(), {"--web", web});
   std::vector<char*> argv;
   for (std::string& word : words) argv.push_back(&word[0]);
   argv.push_back(nullptr);
-  std::string out_path = root_ + "/serve.out";
-  std::string err_path = root_ + "/serve.err";
-  // A server started before on this root must not be taken for this one.
+  const std::string out_path = root_ + "/serve.out";
+  const std::string err_path = root_ + "/serve.err";
+  // The output of a server started before on this root is not this one's.
   unlink(out_path.c_str());
-  unlink(err_path.c_str());
-
   pid_ = fork();
   if (pid_ == 0) {
     prctl(PR_SET_PDEATHSIG, SIGKILL);  // Never outlive a crashed test.
     int out = open(out_path.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
     int err = open(err_path.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
-    if (out < 0 || err < 0 || dup2(out, STDOUT_FILENO) < 0 || dup2(err, STDERR_FILENO) < 0) {
-      _exit(127);
+    if (out >= 0 && err >= 0 && dup2(out, STDOUT_FILENO) >= 0 && dup2(err, STDERR_FILENO) >= 0) {
+      execv(argv[0], argv.data());
     }
-    execv(argv[0], argv.data());
     _exit(127);
   }
-  if (pid_ < 0) return;
-  auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
-  while (std::chrono::steady_clock::now() < deadline) {
-    std::string output = Output();
-    if (output.find("\ntoken: ") != std::string::npos) {
-      http_port_ = PortOnLine(output, "http: ");
-      https_port_ = PortOnLine(output, "https: ");
-      return;
-    }
+  // The token line comes last, once both listeners are set up.
+  WaitFor([this] {
     int status;
-    if (waitpid(pid_, &status, WNOHANG) == pid_) {
-      pid_ = -1;
-      return;
-    }
-    std::this_thread::sleep_for(std::chrono::milliseconds(10));
-  }
+    if (pid_ > 0 && waitpid(pid_, &status, WNOHANG) == pid_) pid_ = -1;
+    return pid_ <= 0 || Output().find("\ntoken: ") != std::string::npos;
+  });
+  const std::string output = pid_ > 0 ? Output() : "";
+  auto port_after = [&](const std::string& text) {
+    const std::string::size_type at = output.find(text);
+    return at == std::string::npos ? 0 : std::atoi(output.c_str() + at + text.size());
+  };
+  http_port_ = port_after("\nhttp:  http://127.0.0.1:");
+  https_port_ = port_after("\nhttps: https://127.0.0.1:");
 }
 
-ServeProcess::~ServeProcess() {
-  if (pid_ > 0) Stop(SIGTERM);
-}
+ServeProcess::~ServeProcess() { Stop(SIGTERM); }
 
 int ServeProcess::Stop(int signalNumber) {
   if (pid_ <= 0) return -1;
   kill(pid_, signalNumber);
   int status = 0;
-  auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
-  while (waitpid(pid_, &status, WNOHANG) != pid_) {
-    if (std::chrono::steady_clock::now() > deadline) {
-      kill(pid_, SIGKILL);
-      waitpid(pid_, &status, 0);
-      pid_ = -1;
-      return -1;
-    }
-    std::this_thread::sleep_for(std::chrono::milliseconds(10));
+  const bool exited = WaitFor([&] { return waitpid(pid_, &status, WNOHANG) == pid_; });
+  if (!exited) {
+    kill(pid_, SIGKILL);
+    waitpid(pid_, &status, 0);
   }
   pid_ = -1;
-  return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+  return exited && WIFEXITED(status) ? WEXITSTATUS(status) : -1;
 }
 
 std::string ServeProcess::Token() const {
   std::string token = ReadFile(TokenPath(root_));
-  while (!token.empty() && (token.back() == '\n' || token.back() == '\r')) token.pop_back();
-  return token;
+  return token.substr(0, token.find('\n'));
 }
 
 httplib::Client ServeProcess::AuthorizedClient() const {
   httplib::Client client("127.0.0.1", http_port_);
   client.set_bearer_token_auth(Token());
-  client.set_read_timeout(30);
+  // A call that changes the store waits for the calls before it.
+  client.set_read_timeout(120);
   return client;
 }
 
 std::string ServeProcess::Output() const { return ReadFile(root_ + "/serve.out"); }
 std::string ServeProcess::Log() const { return ReadFile(root_ + "/serve.err"); }
 
-long ServeProcess::ResidentKib() const {
-  std::ifstream status("/proc/" + std::to_string(pid_) + "/status");
-  std::string line;
-  while (std::getline(status, line)) {
-    if (line.rfind("VmRSS:", 0) == 0) return std::atol(line.c_str() + 6);
+void ServeTest::SetUp() {
+  std::string error;
+  ASSERT_TRUE(InitDeviceRoot(scratch_.root(), &error)) << error;
+}
+
+bool WaitFor(const std::function<bool()>& done) {
+  const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+  while (!done()) {
+    if (std::chrono::steady_clock::now() > deadline) return false;
+    std::this_thread::sleep_for(std::chrono::milliseconds(10));
   }
-  return -1;
+  return true;
 }
 
 int CountFiles(const std::string& folder) {
@@ -138,88 +110,74 @@ int CountFiles(const std::string& folder) {
   return error ? -1 : static_cast<int>(std::distance(entries, {}));
 }
 
-namespace {
-
-struct SocketCloser {
-  explicit SocketCloser(int fd) : fd(fd) {}
-  ~SocketCloser() {
-    if (fd >= 0) close(fd);
+std::string PresentedSubjects(int port) {
+  // The tool lists the chain it was sent as lines " N s:SUBJECT".
+  const std::string command = "openssl s_client -connect 127.0.0.1:" + std::to_string(port) +
+                              " </dev/null 2>/dev/null";
+  std::unique_ptr<FILE, int (*)(FILE*)> tool(popen(command.c_str(), "r"), pclose);
+  std::string subjects;
+  char line[4096];
+  while (tool && std::fgets(line, sizeof(line), tool.get()) != nullptr) {
+    int number, subject_at = 0;
+    if (std::sscanf(line, " %d s:%n", &number, &subject_at) == 1 && subject_at > 0) {
+      subjects += line + subject_at;
+    }
   }
-  int fd;
-};
+  return subjects;
+}
 
-sockaddr_in Loopback(int port) {
+RawConnection::RawConnection(int port, const std::string& request)
+    : fd_(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
   sockaddr_in address{};
   address.sin_family = AF_INET;
   address.sin_port = htons(static_cast<uint16_t>(port));
   address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-  return address;
+  if (fd_ >= 0 &&
+      (connect(fd_, reinterpret_cast<sockaddr*>(&address), sizeof(address)) != 0 ||
+       send(fd_, request.data(), request.size(), MSG_NOSIGNAL) !=
+           static_cast<ssize_t>(request.size()))) {
+    close(fd_);
+    fd_ = -1;
+  }
 }
 
-}  // namespace
+RawConnection::~RawConnection() {
+  if (fd_ >= 0) close(fd_);
+}
 
-std::string RawExchange(int port, const std::string& request, int firstReplyMs) {
-  SocketCloser socket_fd(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
-  sockaddr_in address = Loopback(port);
-  if (socket_fd.fd < 0 ||
-      connect(socket_fd.fd, reinterpret_cast<sockaddr*>(&address), sizeof(address)) != 0) {
-    return "";
-  }
-  if (send(socket_fd.fd, request.data(), request.size(), MSG_NOSIGNAL) !=
-      static_cast<ssize_t>(request.size())) {
-    return "";
-  }
+std::string RawConnection::Reply(int firstReplyMs) {
   std::string response;
-  pollfd waiting{socket_fd.fd, POLLIN, 0};
+  pollfd waiting{fd_, POLLIN, 0};
   char buffer[4096];
-  while (poll(&waiting, 1, response.empty() ? firstReplyMs : 1000) > 0) {
-    ssize_t got = recv(socket_fd.fd, buffer, sizeof(buffer), 0);
+  while (fd_ >= 0 && poll(&waiting, 1, response.empty() ? firstReplyMs : 1000) > 0) {
+    ssize_t got = recv(fd_, buffer, sizeof(buffer), 0);
     if (got <= 0) break;
     response.append(buffer, static_cast<size_t>(got));
   }
   return response;
 }
 
+std::string RawExchange(int port, const std::string& request) {
+  return RawConnection(port, request).Reply();
+}
+
 int RawStatus(const std::string& response) {
-  if (response.rfind("HTTP/1.1 ", 0) != 0) return 0;
-  return std::atoi(response.c_str() + 9);
+  return response.rfind("HTTP/1.1 ", 0) == 0 ? std::atoi(response.c_str() + 9) : 0;
 }
 
 httplib::MultipartFormDataItems ImportForm(const std::string& cert, const std::string& key,
                                            const std::string& chain) {
   return {{"api", "ORVA.Core.Certificate", "", ""},
           {"method", "import", "", ""},
-          {"cert", cert, "server.crt", "application/x-pem-file"},
-          {"key", key, "server.key", "application/x-pem-file"},
-          {"inter_cert", chain, "chain.crt", "application/x-pem-file"}};
-}
-
-Json::Value HostError(int code) {
-  Json::Value answer(Json::objectValue);
-  answer["success"] = false;
-  answer["error"]["code"] = code;
-  return answer;
+          {"cert", cert, "server.crt", ""},
+          {"key", key, "server.key", ""},
+          {"inter_cert", chain, "chain.crt", ""}};
 }
 
 Json::Value ParseJson(const std::string& text) {
-  Json::CharReaderBuilder builder;
-  std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
   Json::Value value;
+  std::istringstream stream(text);
+  Json::CharReaderBuilder builder;
   std::string errors;
-  if (!reader->parse(text.data(), text.data() + text.size(), &value, &errors)) {
-    return Json::Value();
-  }
-  return value;
-}
-
-int FreeLoopbackPort() {
-  SocketCloser socket_fd(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
-  sockaddr_in address = Loopback(0);
-  socklen_t length = sizeof(address);
-  if (socket_fd.fd < 0 ||
-      bind(socket_fd.fd, reinterpret_cast<sockaddr*>(&address), sizeof(address)) != 0 ||
-      getsockname(socket_fd.fd, reinterpret_cast<sockaddr*>(&address), &length) != 0) {
-    return 0;
-  }
-  return ntohs(address.sin_port);
+  return Json::parseFromStream(builder, stream, &value, &errors) ? value : Json::Value();
 }

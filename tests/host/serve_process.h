@@ -6,20 +6,26 @@
 #include <httplib.h>
 #include <json/json.h>
 
+#include <functional>
 #include <string>
-#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "tests/support/test_support.h"
+
+inline constexpr char kListQuery[] = "/webapi?api=ORVA.Core.Certificate&method=list";
 
 // A real "orva-webapi serve" on loopback for one test: started on free
 // ports with the test module loaded, and stopped (SIGTERM, then SIGKILL)
-// when the object goes away, whatever the test did. The server's standard
-// output and error go to files in the device root, its temporary uploads
-// to `UploadFolder()`.
+// when the object goes away, whatever the test did. Its standard output and
+// error go to files in the device root, its temporary uploads to
+// `UploadFolder()`.
 class ServeProcess {
  public:
-  // Starts the server on `root` (a device root made by init) with
-  // `arguments` added to the command line, and waits until it has printed
-  // its URLs. started() tells whether it did.
-  ServeProcess(const std::string& root, const std::vector<std::string>& arguments = {});
+  // Starts the server on `root` (a device root made by init), with
+  // `web` as its page folder when given, and waits until it has printed
+  // its URLs and token line. started() tells whether it did.
+  explicit ServeProcess(const std::string& root, const std::string& web = "");
   ~ServeProcess();
 
   ServeProcess(const ServeProcess&) = delete;
@@ -27,8 +33,7 @@ class ServeProcess {
 
   bool started() const { return http_port_ > 0; }
   int http_port() const { return http_port_; }
-  // 0 when the server printed no HTTPS URL.
-  int https_port() const { return https_port_; }
+  int https_port() const { return https_port_; }  // 0 when HTTPS is not up
   std::string UploadFolder() const { return root_ + "/uploads"; }
 
   // A client of the HTTP listener that sends the device root's token.
@@ -41,8 +46,6 @@ class ServeProcess {
 
   std::string Output() const;  // standard output so far
   std::string Log() const;     // standard error (the syslog copy) so far
-  // The server's resident set size in KiB, or -1.
-  long ResidentKib() const;
 
  private:
   std::string root_;
@@ -51,14 +54,43 @@ class ServeProcess {
   int https_port_ = 0;
 };
 
+// Tests with a device root made by init.
+class ServeTest : public testing::Test {
+ protected:
+  void SetUp() override;
+  TempDeviceRoot scratch_;
+};
+
+// Polls `done` every 10 ms for up to 10 s; true once it holds.
+bool WaitFor(const std::function<bool()>& done);
+
 // The number of files in `folder` (-1 when it cannot be read).
 int CountFiles(const std::string& folder);
 
-// Sends `request` as it stands to 127.0.0.1:PORT over plain TCP and returns
-// everything the server sent until it closed the connection or went quiet
-// for a second (for `firstReplyMs` before its first byte).
-std::string RawExchange(int port, const std::string& request, int firstReplyMs = 1000);
+// The subjects of the certificates that a new TLS handshake with
+// 127.0.0.1:PORT presents, leaf first, one "CN = name" line each; "" when
+// the handshake fails.
+std::string PresentedSubjects(int port);
 
+// A TCP connection to 127.0.0.1:PORT that has sent `request` as it stands
+// (nothing when it could not connect).
+class RawConnection {
+ public:
+  RawConnection(int port, const std::string& request);
+  ~RawConnection();
+  RawConnection(const RawConnection&) = delete;
+  RawConnection& operator=(const RawConnection&) = delete;
+
+  // Everything the server sent until it closed the connection or went
+  // quiet for a second (for `firstReplyMs` before its first byte).
+  std::string Reply(int firstReplyMs = 1000);
+
+ private:
+  int fd_ = -1;
+};
+
+// The reply to `request` sent on a new connection.
+std::string RawExchange(int port, const std::string& request);
 // The HTTP status of a raw response ("HTTP/1.1 404 ..."), or 0.
 int RawStatus(const std::string& response);
 
@@ -66,13 +98,7 @@ int RawStatus(const std::string& response);
 httplib::MultipartFormDataItems ImportForm(const std::string& cert, const std::string& key,
                                            const std::string& chain);
 
-// The host's answer to a request it refuses with HTTP status `code`.
-Json::Value HostError(int code);
-
 // `text` parsed as JSON (null when it is not JSON).
 Json::Value ParseJson(const std::string& text);
-
-// A port on 127.0.0.1 that was free a moment ago.
-int FreeLoopbackPort();
 
 #endif  // ORVA_TESTS_HOST_SERVE_PROCESS_H_

@@ -2,7 +2,6 @@
 
 #include <cstdio>
 #include <cstdlib>
-#include <initializer_list>
 
 #include "tests/support/test_support.h"
 
@@ -15,9 +14,26 @@ std::string Quote(const std::string& text) {
   return quoted + "'";
 }
 
-// Makes the folders of each path's parent.
-void MakeParents(std::initializer_list<std::string> paths) {
-  for (const std::string& path : paths) MakeDirs(path.substr(0, path.rfind('/')));
+// Runs `openssl req` with a new key of `type` written to `keyPath` and
+// `options` added, making the key's folder and the folder of `outPath`.
+bool NewKeyRequest(const std::string& keyPath, const std::string& outPath, int bits,
+                   KeyType type, const std::string& options) {
+  MakeDirs(keyPath.substr(0, keyPath.rfind('/')));
+  MakeDirs(outPath.substr(0, outPath.rfind('/')));
+  const std::string bitsText = std::to_string(bits);
+  const std::string dsaParameters = keyPath + ".dsaparam";
+  std::string newKey = "rsa:" + bitsText;
+  if (type == KeyType::kEc) newKey = "ec -pkeyopt ec_paramgen_curve:P-256";
+  if (type == KeyType::kDsa) {
+    if (!RunForTest("openssl dsaparam -out " + Quote(dsaParameters) + " " + bitsText)) {
+      return false;
+    }
+    newKey = "dsa:" + Quote(dsaParameters);
+  }
+  bool made = RunForTest("openssl req -newkey " + newKey + " -nodes -keyout " + Quote(keyPath) +
+                         " -out " + Quote(outPath) + " " + options);
+  std::remove(dsaParameters.c_str());
+  return made;
 }
 
 }  // namespace
@@ -27,28 +43,33 @@ bool RunForTest(const std::string& commandLine) {
 }
 
 bool MakeSelfSignedCa(const std::string& keyPath, const std::string& certPath,
-                      const std::string& subject, int bits) {
-  MakeParents({keyPath, certPath});
-  return RunForTest("openssl req -x509 -newkey rsa:" + std::to_string(bits) + " -nodes -keyout " +
-                    Quote(keyPath) + " -out " + Quote(certPath) + " -days 365 -subj " +
-                    Quote(subject));
+                      const std::string& subject, int bits, KeyType type) {
+  return NewKeyRequest(keyPath, certPath, bits, type,
+                       "-x509 -days 365 -subj " + Quote(subject));
 }
 
 bool MakeRequest(const std::string& keyPath, const std::string& csrPath,
                  const std::string& subject, int bits) {
-  MakeParents({keyPath, csrPath});
-  return RunForTest("openssl req -newkey rsa:" + std::to_string(bits) + " -nodes -keyout " +
-                    Quote(keyPath) + " -out " + Quote(csrPath) + " -subj " + Quote(subject));
+  return NewKeyRequest(keyPath, csrPath, bits, KeyType::kRsa, "-subj " + Quote(subject));
 }
 
 bool MakeSignedCertificate(const std::string& caKeyPath, const std::string& caCertPath,
                            const std::string& keyPath, const std::string& certPath,
-                           const std::string& subject, int bits) {
-  std::string csr = certPath + ".csr";
-  bool made = MakeRequest(keyPath, csr, subject, bits) &&
+                           const std::string& subject, int bits, KeyType type) {
+  const std::string csr = certPath + ".csr";
+  bool made = NewKeyRequest(keyPath, csr, bits, type, "-subj " + Quote(subject)) &&
               RunForTest("openssl x509 -req -in " + Quote(csr) + " -CA " + Quote(caCertPath) +
                          " -CAkey " + Quote(caKeyPath) + " -set_serial 7 -days 200 -out " +
                          Quote(certPath));
   std::remove(csr.c_str());
   return made;
+}
+
+bool MakeChain(const std::string& folder, const std::string& subject, int bits) {
+  const std::string at = folder + "/";
+  return MakeSelfSignedCa(at + "root.key", at + "root.crt", "/CN=Root", bits) &&
+         MakeSignedCertificate(at + "root.key", at + "root.crt", at + "inter.key",
+                               at + "inter.crt", "/CN=Intermediate", bits) &&
+         MakeSignedCertificate(at + "inter.key", at + "inter.crt", at + "server.key",
+                               at + "server.crt", subject, bits);
 }

@@ -3,25 +3,37 @@
 
 #include <string>
 
-// Test fixtures made with the machine's openssl tool. Each returns true on
-// success. Paths are real paths (already under a device root).
+// PEM fixtures made with the machine's openssl tool: the one place tests
+// make keys, requests and certificates. Paths are real paths (already under
+// a device root); missing folders are made. Each returns true on success.
+// Keys are written as the tool writes them ("BEGIN PRIVATE KEY").
 
-// A self-signed CA certificate with a new RSA key of `bits`.
+// RSA of `bits`, EC on P-256 (`bits` unused), or DSA of `bits`.
+enum class KeyType { kRsa, kEc, kDsa };
+
+// A self-signed CA certificate for `subject` with a new key.
 bool MakeSelfSignedCa(const std::string& keyPath, const std::string& certPath,
-                      const std::string& subject, int bits = 2048);
+                      const std::string& subject, int bits = 2048,
+                      KeyType type = KeyType::kRsa);
 
 // A new key and a certificate for `subject` signed by the CA.
-bool MakeSignedCertificate(const std::string& caKeyPath,
-                           const std::string& caCertPath,
-                           const std::string& keyPath,
-                           const std::string& certPath,
-                           const std::string& subject, int bits = 2048);
+bool MakeSignedCertificate(const std::string& caKeyPath, const std::string& caCertPath,
+                           const std::string& keyPath, const std::string& certPath,
+                           const std::string& subject, int bits = 2048,
+                           KeyType type = KeyType::kRsa);
 
-// A new key and a certificate signing request for `subject`.
+// A new RSA key and a certificate signing request for `subject`.
 bool MakeRequest(const std::string& keyPath, const std::string& csrPath,
                  const std::string& subject, int bits = 2048);
 
-// Runs a shell command line for test set-up; true when it exited with 0.
+// An issuing chain in `folder`: root.key and root.crt ("/CN=Root"),
+// inter.key and inter.crt ("/CN=Intermediate", issued by the root), and
+// server.key and server.crt (`subject`, issued by the intermediate), all
+// RSA keys of `bits`.
+bool MakeChain(const std::string& folder, const std::string& subject, int bits = 1024);
+
+// Runs a shell command line for test set-up, without input or output;
+// true when it exited with 0.
 bool RunForTest(const std::string& commandLine);
 
 #endif  // ORVA_TESTS_SUPPORT_CERTIFICATES_H_

@@ -51,8 +51,6 @@ ORVA::APIResponse CallCreateCrt() {
   return CallMethod(doCertificateCreateCRT_v1, params).response;
 }
 
-ORVA::APIResponse CallList() { return CallMethod(doCertificateList_v1).response; }
-
 ORVA::APIResponse CallImport(const std::string& certPath, const std::string& keyPath,
                              const std::string& interPath) {
   Json::Value params(Json::objectValue);

@@ -34,7 +34,6 @@ ORVA::APIResponse CallRenew();
 // Signs the request file at the real path `csrPath` for 30 days.
 ORVA::APIResponse CallSign(const std::string& csrPath);
 ORVA::APIResponse CallCreateCrt();
-ORVA::APIResponse CallList();
 // Imports the uploads at the real paths given, as the host hands them over.
 ORVA::APIResponse CallImport(const std::string& certPath, const std::string& keyPath,
                              const std::string& interPath);

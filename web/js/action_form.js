@@ -3,6 +3,7 @@
 
 import { aliasProblem } from './aliases.js';
 import { describeError } from './messages.js';
+import { showControlProblem, showMessage } from './show_message.js';
 
 // Checks that the browser cannot make, named by a control's data-check.
 const CUSTOM_CHECKS = { aliases: aliasProblem };
@@ -11,11 +12,9 @@ const CUSTOM_CHECKS = { aliases: aliasProblem };
 // the error's (for example "The request was made, but its download failed.").
 export class StepFailure extends Error {
   constructor(cause, context, lead) {
-    super(lead);
+    super(lead, { cause });
     this.name = 'StepFailure';
-    this.cause = cause;
     this.context = context;
-    this.lead = lead;
   }
 }
 
@@ -45,21 +44,15 @@ function controlProblem(control) {
   return `“${label}”: ${control.validationMessage}`;
 }
 
-function showMessage(element, text, tone) {
-  element.textContent = text;
-  element.dataset.tone = tone;
-}
-
 function explain(error, context) {
   if (error instanceof StepFailure) {
-    return `${error.lead} ${describeError(error.cause, error.context)}`;
+    return `${error.message} ${describeError(error.cause, error.context)}`;
   }
   return describeError(error, context);
 }
 
 function setBusy(form, busy, button, idleLabel) {
   form.setAttribute('aria-busy', String(busy));
-  form.classList.toggle('busy', busy);
   for (const control of form.elements) {
     if (control === button) continue;
     if (control instanceof HTMLFieldSetElement) continue;
@@ -72,8 +65,8 @@ function setBusy(form, busy, button, idleLabel) {
 }
 
 // Binds `form` to `run(values, form)`, which does the work with the form's values
-// (a FormData taken before the form is locked) and resolves with
-// { text, tone } to show; whatever it throws is shown as an error sentence.
+// (a FormData taken before the form is locked) and resolves with { text },
+// the success to tell; whatever it throws is shown as an error sentence.
 // `busyText` tells what the device is doing while the form is locked.
 export function bindActionForm(form, run, busyText) {
   const context = form.dataset.action;
@@ -82,10 +75,6 @@ export function bindActionForm(form, run, busyText) {
   const idleLabel = button.textContent;
   let busy = false;
 
-  form.addEventListener('input', (event) => {
-    event.target.removeAttribute?.('aria-invalid');
-  });
-
   form.addEventListener('submit', async (event) => {
     event.preventDefault();
     if (busy) return;
@@ -93,9 +82,7 @@ export function bindActionForm(form, run, busyText) {
     for (const control of form.elements) {
       const problem = controlProblem(control);
       if (problem !== '') {
-        control.setAttribute('aria-invalid', 'true');
-        showMessage(message, problem, 'error');
-        control.focus();
+        showControlProblem(message, control, problem);
         return;
       }
     }
@@ -106,7 +93,7 @@ export function bindActionForm(form, run, busyText) {
     showMessage(message, busyText, 'busy');
     try {
       const outcome = await run(values, form);
-      showMessage(message, outcome.text, outcome.tone || 'success');
+      showMessage(message, outcome.text, 'success');
     } catch (error) {
       showMessage(message, explain(error, context), 'error');
     } finally {

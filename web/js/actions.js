@@ -116,12 +116,14 @@ export function actionRuns(api, installed) {
   };
 }
 
+const MAKING_REQUEST = 'Making the key and the request. This can take a minute.';
+
 // What each form tells while the device works.
 export const BUSY_TEXTS = {
   'crt-create': 'Making two keys and the certificates. This can take a minute; ' +
     'the form stays locked until the device answers.',
-  'csr-create': 'Making the key and the request. This can take a minute.',
-  'csr-renew': 'Making the key and the request. This can take a minute.',
+  'csr-create': MAKING_REQUEST,
+  'csr-renew': MAKING_REQUEST,
   import: 'Checking and installing the files…',
   'csr-sign': 'Signing the request…',
   export: 'Packing the files…',

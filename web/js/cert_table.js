@@ -11,10 +11,6 @@ const ROLE_NAMES = {
   inter_cert: 'Intermediate',
 };
 
-const COLUMN_NAMES = [
-  'Role', 'Subject', 'Issuer', 'Signature algorithm', 'Valid from', 'Valid until', 'Days left',
-];
-
 function element(tag, text = '', className = '') {
   const node = document.createElement(tag);
   if (text !== '') node.textContent = text;
@@ -74,7 +70,7 @@ function sameName(first, second) {
   return first !== null && JSON.stringify(first) === JSON.stringify(second);
 }
 
-function row(entry, now) {
+function row(entry, now, columnNames) {
   const from = parseCertificateTime(entry.valid_from);
   const until = parseCertificateTime(entry.valid_till);
   const state = validityState(from, until, now);
@@ -92,11 +88,13 @@ function row(entry, now) {
   tr.append(timeCell(entry.valid_till));
   tr.append(daysLeftCell(state, days, daysAgo));
   // The column name of each cell, shown beside the value on narrow screens.
-  [...tr.cells].forEach((cell, index) => { cell.dataset.label = COLUMN_NAMES[index]; });
+  [...tr.cells].forEach((cell, index) => { cell.dataset.label = columnNames[index]; });
   return tr;
 }
 
-// Replaces the rows of `tbody` with one row per certificate entry.
-export function renderCertificates(tbody, entries, now = new Date()) {
-  tbody.replaceChildren(...entries.map((entry) => row(entry, now)));
+// Replaces the rows of `table`'s body with one row per certificate entry,
+// in the order of the columns its head names.
+export function renderCertificates(table, entries, now = new Date()) {
+  const columnNames = [...table.tHead.rows[0].cells].map((cell) => cell.textContent);
+  table.tBodies[0].replaceChildren(...entries.map((entry) => row(entry, now, columnNames)));
 }

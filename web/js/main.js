@@ -6,6 +6,7 @@ import { BUSY_TEXTS, actionRuns } from './actions.js';
 import { renderCertificates } from './cert_table.js';
 import { loadInstalledCertificates } from './certificate_list.js';
 import { describeError } from './messages.js';
+import { showMessage } from './show_message.js';
 import { buildSubjectFields } from './subject_fields.js';
 import { TokenGate } from './token_gate.js';
 import { WebApi } from './webapi.js';
@@ -36,17 +37,15 @@ const pageNotice = byId('page-notice');
 // the device does not answer (its web server may be restarting).
 async function refreshTable(retries = 0) {
   tableSection.setAttribute('aria-busy', 'true');
-  tableMessage.dataset.tone = 'busy';
-  tableMessage.textContent = 'Reading the installed certificates…';
+  showMessage(tableMessage, 'Reading the installed certificates…', 'busy');
   try {
     for (let attempt = 0; ; attempt += 1) {
       try {
         const entries = await loadInstalledCertificates(api);
-        renderCertificates(table.tBodies[0], entries);
+        renderCertificates(table, entries);
         table.hidden = entries.length === 0;
         emptyStore.hidden = entries.length !== 0;
-        tableMessage.textContent = '';
-        delete tableMessage.dataset.tone;
+        showMessage(tableMessage, '');
         return;
       } catch (error) {
         if (error?.kind !== 'network' || attempt >= retries) throw error;
@@ -54,8 +53,7 @@ async function refreshTable(retries = 0) {
       }
     }
   } catch (error) {
-    tableMessage.dataset.tone = 'error';
-    tableMessage.textContent = describeError(error, 'list');
+    showMessage(tableMessage, describeError(error, 'list'), 'error');
   } finally {
     tableSection.setAttribute('aria-busy', 'false');
   }
@@ -78,13 +76,6 @@ function installed(data) {
   return 'The device’s secure services restarted with it.';
 }
 
-function openAction(id) {
-  const details = byId(id);
-  if (details === null) return;
-  details.open = true;
-  details.querySelector('summary').focus();
-}
-
 buildSubjectFields(document, byId('subject-fields'));
 
 const runs = actionRuns(api, installed);
@@ -96,8 +87,10 @@ for (const form of document.querySelectorAll('form[data-action]')) {
 for (const link of document.querySelectorAll('[data-open-action]')) {
   link.addEventListener('click', (event) => {
     event.preventDefault();
-    openAction(link.dataset.openAction);
-    byId(link.dataset.openAction).scrollIntoView({ block: 'start' });
+    const details = byId(link.dataset.openAction);
+    details.open = true;
+    details.querySelector('summary').focus();
+    details.scrollIntoView({ block: 'start' });
   });
 }
 

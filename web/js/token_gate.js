@@ -1,12 +1,14 @@
 // Asks for the access token. While the question is open the rest of the page
 // is hidden; every request that needs a token waits for the same answer.
 
+import { showControlProblem, showMessage } from './show_message.js';
 import { forgetStoredToken, storeToken, storedToken } from './token_store.js';
 
+// Why the token is asked for: the sentence, and its tone.
 const REASONS = {
-  missing: '',
-  refused: 'The device did not accept this access token. Enter it again.',
-  forgotten: 'The access token was forgotten. Enter it to go on.',
+  missing: ['', ''],
+  refused: ['The device did not accept this access token. Enter it again.', 'error'],
+  forgotten: ['The access token was forgotten. Enter it to go on.', ''],
 };
 
 // A token goes into an HTTP header, which carries visible ASCII only.
@@ -32,8 +34,15 @@ export class TokenGate {
       event.preventDefault();
       this.accept();
     });
-    elements.forgetButton.hidden = this.token === '';
-    elements.app.hidden = this.token === '';
+    this.setAsking(this.token === '');
+  }
+
+  // Shows the question with the page hidden, or the page without it.
+  setAsking(asking) {
+    const { gate, app, forgetButton } = this.elements;
+    gate.hidden = !asking;
+    app.hidden = asking;
+    forgetButton.hidden = asking;
   }
 
   current() {
@@ -65,35 +74,27 @@ export class TokenGate {
   }
 
   show(reason) {
-    const { gate, input, reason: reasonText, app, forgetButton } = this.elements;
+    const { gate, input, reason: reasonText } = this.elements;
     if (gate.hidden) this.focusBefore = document.activeElement;
-    reasonText.textContent = REASONS[reason] || '';
-    reasonText.classList.toggle('error', reason === 'refused');
-    app.hidden = true;
-    forgetButton.hidden = true;
-    gate.hidden = false;
+    showMessage(reasonText, ...REASONS[reason]);
+    this.setAsking(true);
     input.value = '';
     input.removeAttribute('aria-invalid');
     input.focus();
   }
 
   accept() {
-    const { gate, input, reason, app, forgetButton } = this.elements;
+    const { input, reason } = this.elements;
     const token = input.value.trim();
     const problem = tokenProblem(token);
     if (problem !== '') {
-      reason.textContent = problem;
-      reason.classList.add('error');
-      input.setAttribute('aria-invalid', 'true');
-      input.focus();
+      showControlProblem(reason, input, problem);
       return;
     }
     this.token = token;
     storeToken(token);
     input.value = '';
-    gate.hidden = true;
-    app.hidden = false;
-    forgetButton.hidden = false;
+    this.setAsking(false);
     this.restoreFocus();
     const resolve = this.resolvePending;
     this.pending = null;

@@ -17,16 +17,16 @@ export class ApiError extends Error {
   }
 }
 
-// Builds the request body. Parameters travel as form fields; `files` maps a
-// parameter name to a File and makes the body multipart (the server stores
-// each part and hands its path to the method).
+// Builds the request body, always multipart: the server stops urlencoded
+// forms at 8 KiB, which a long list of names can pass. `files` maps a
+// parameter name to a File or null; the server stores each file part and
+// hands its path to the method.
 function requestBody(api, method, params, files) {
-  const fields = { api, method, version: VERSION, ...params };
-  const entries = Object.entries(files).filter(([, file]) => file);
-  if (entries.length === 0) return new URLSearchParams(fields);
   const form = new FormData();
-  for (const [name, value] of Object.entries(fields)) form.append(name, value);
-  for (const [name, file] of entries) form.append(name, file, file.name);
+  for (const [name, value] of Object.entries({ api, method, version: VERSION, ...params })) {
+    form.append(name, value);
+  }
+  for (const [name, file] of Object.entries(files)) if (file) form.append(name, file, file.name);
   return form;
 }
 
