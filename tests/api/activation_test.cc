@@ -1,5 +1,5 @@
 // What each activation sequence restarts, in which order, what it logs
-// (messages only, each naming the caller's file) and whether it asks for
+// (messages only, each naming the caller's file and line) and whether it asks for
 // the host's restart.
 
 #include <regex>
@@ -55,8 +55,9 @@ TEST(Activation, RestartsEnabledServicesInTheSequencesOrderAndLogsEachFailureOnc
     result["restart_httpd"] = false;
     OLIBPLUGIN_HANDLE handle = nullptr;
     LogCapture log;
-    activateCertificate(c.sequence, &response, result, OrvaConf(), &handle, "/src/caller.cc");
-    const std::regex prefix("orva-test: caller\\.cc:[0-9]+ ");
+    activateCertificate(c.sequence, &response, result, OrvaConf(), &handle, "/src/caller.cc",
+                        4242);
+    const std::regex prefix("orva-test: caller\\.cc:4242 ");
     EXPECT_EQ(c.log, std::regex_replace(log.Text(), prefix, ""));
     EXPECT_EQ(c.events, ReadFile(root.Path("/events")));
     EXPECT_EQ(c.host_restart, result["restart_httpd"].asBool());

@@ -41,7 +41,7 @@ bool OtherThreadsSleep() {
 
 }  // namespace
 
-TEST(CallOrder, ListCallsShareTheLockAndEveryCallStartsInTheOrderItCame) {
+TEST(CallOrder, ListNeverWaitsAndChangesStartOneAtATimeInTheOrderTheyCame) {
   // Each step: a call arrives (with its api and method) or a running call
   // ends; then the calls that start.
   const struct {
@@ -51,17 +51,16 @@ TEST(CallOrder, ListCallsShareTheLockAndEveryCallStartsInTheOrderItCame) {
     const char* starting;
   } steps[] = {
       {"reader 1", "ORVA.Core.Certificate", "list", "reader 1 "},
-      {"reader 2", "ORVA.Core.Certificate", "list", "reader 2 "},
-      // Only the certificate list shares the lock: "list" of another api writes.
-      {"writer 1", "ORVA.Core.Certificate.CSR", "list", ""},
+      // Only the certificate list goes without a turn: "list" of another api
+      // changes the store.
+      {"writer 1", "ORVA.Core.Certificate.CSR", "list", "writer 1 "},
       {"writer 2", "ORVA.Core.Certificate.CRT", "create", ""},
-      {"reader 3", "ORVA.Core.Certificate", "list", ""},
+      {"reader 2", "ORVA.Core.Certificate", "list", "reader 2 "},
       {"writer 3", "ORVA.Core.Certificate.CRT", "create", ""},
-      {"reader 1", nullptr, nullptr, ""},
-      {"reader 2", nullptr, nullptr, "writer 1 "},
       {"writer 1", nullptr, nullptr, "writer 2 "},
-      {"writer 2", nullptr, nullptr, "reader 3 "},
-      {"reader 3", nullptr, nullptr, "writer 3 "},
+      {"reader 1", nullptr, nullptr, ""},
+      {"writer 2", nullptr, nullptr, "writer 3 "},
+      {"reader 2", nullptr, nullptr, ""},
       {"writer 3", nullptr, nullptr, ""},
   };
   CallOrder order;
@@ -104,7 +103,7 @@ TEST(HttpsListener, ReloadReadsTheStoreOnlyOnceTheChangeUnderWayIsDone) {
   const int port = https.port();
   ASSERT_EQ("CN = first.test\n", PresentedSubjects(port));
   {
-    CallOrder::Turn changing(&order, false);
+    CallOrder::Turn changing(&order);
     scratch.WriteFile("/usr/orva/etc/ssl/ssl.crt/server.crt", "half written\n");
     https.RequestReload();
     ASSERT_TRUE(OtherThreadsSleep());

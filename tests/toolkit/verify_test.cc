@@ -30,16 +30,25 @@ TEST(VerifyCrtAndKey, ResultsForPairsAndUnreadableFiles) {
 }
 
 // A root, an intermediate it issued, and a server certificate the
-// intermediate issued, in either file and any order.
-TEST(VerifyCrtChain, ResultsForSetsInEitherFileOrder) {
+// intermediate issued: the upper file must hold the server certificate's
+// issuers, in any order. A certificate that copies the intermediate's name,
+// or one the server certificate issued, is no issuer.
+TEST(VerifyCrtChain, UpperCertificatesMustHaveSignedTheCertificate) {
   TempDeviceRoot root;
   ASSERT_TRUE(MakeChain(root.root(), "/CN=nas.local"));
+  ASSERT_TRUE(MakeSelfSignedCa(root.Path("/copy.key"), root.Path("/copy.crt"), "/CN=Intermediate",
+                               1024));
+  ASSERT_TRUE(MakeSignedCertificate(root.Path("/server.key"), root.Path("/server.crt"),
+                                    root.Path("/below.key"), root.Path("/below.crt"),
+                                    "/CN=below", 1024));
   root.WriteFile("/inter+root.crt", ReadFile(root.Path("/inter.crt")) + ReadFile(root.Path("/root.crt")));
+  root.WriteFile("/root+inter.crt", ReadFile(root.Path("/root.crt")) + ReadFile(root.Path("/inter.crt")));
   root.WriteFile("/empty.crt", "");
   const struct { const char *certificate, *upper; int result; } cases[] = {
-      {"/server.crt", "/inter.crt", 0},      {"/inter.crt", "/server.crt", 0},
-      {"/server.crt", "/inter+root.crt", 0}, {"/inter+root.crt", "/server.crt", 0},
-      {"/server.crt", "/root.crt", 1},       {"/server.crt", "/empty.crt", 0},
+      {"/server.crt", "/inter.crt", 0},      {"/server.crt", "/inter+root.crt", 0},
+      {"/server.crt", "/root+inter.crt", 0}, {"/inter.crt", "/server.crt", 1},
+      {"/server.crt", "/root.crt", 1},       {"/server.crt", "/copy.crt", 1},
+      {"/server.crt", "/below.crt", 1},      {"/server.crt", "/empty.crt", 0},
       {"/empty.crt", "/empty.crt", 1},       {"/server.crt", "/absent.crt", -1},
   };
   for (const auto& c : cases) {

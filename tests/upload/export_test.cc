@@ -1,6 +1,8 @@
 // The export: which files each set packs, the archive's mode, and the sets
 // that are handed out once.
 
+#include <sys/stat.h>
+
 #include <string>
 #include <vector>
 
@@ -14,13 +16,18 @@
 namespace {
 
 // The members of the archive that an export of `set` sent, one per line as
-// unzip lists them; "" when it sent nothing (and answered nothing).
+// unzip lists them; "" when it sent nothing (and answered nothing, keeping
+// the last archive as it was).
 std::string ExportedMembers(const TempDeviceRoot& root, const std::string& set) {
+  struct stat archive;
+  const bool kept = stat(root.Path(kArchivePath).c_str(), &archive) == 0 && S_ISREG(archive.st_mode);
+  const std::string last = kept ? ReadFile(root.Path(kArchivePath)) : "";
   const MethodAnswer answer = CallExport(set);
   EXPECT_EQ(ORVA::APIResponse::Outcome::kNone, answer.response.outcome());
   EXPECT_EQ(!answer.download.has_body, answer.response.output_enabled());
   if (!answer.download.has_body) {
-    EXPECT_FALSE(FileExists(root.Path(kArchivePath))) << "no archive is left behind";
+    EXPECT_TRUE(kept) << "a set handed out once is asked for again after an archive was made";
+    EXPECT_EQ(last, ReadFile(root.Path(kArchivePath))) << "the last archive is kept";
     return "";
   }
   const decltype(answer.download.headers) expected = {
@@ -28,6 +35,7 @@ std::string ExportedMembers(const TempDeviceRoot& root, const std::string& set) 
   EXPECT_EQ(expected, answer.download.headers);
   EXPECT_EQ(answer.download.body, ReadFile(root.Path(kArchivePath)));
   EXPECT_EQ(0400, FileMode(root.Path(kArchivePath)));
+  EXPECT_EQ(0700, FileMode(root.Path(kGenDir))) << "the generation area is private";
   EXPECT_TRUE(RunForTest("(unzip -Z1 '" + root.Path(kArchivePath) + "' | sort >'" +
                          root.Path("/members") + "')"));
   return ReadFile(root.Path("/members"));
@@ -52,6 +60,7 @@ TEST(CertificateExport, EachSetPacksItsFilesAndGeneratedSetsAreHandedOutOnce) {
     TempDeviceRoot root;
     for (const char* path : store) root.WriteFile(path, std::string("content of ") + path, 0400);
     root.WriteFile(std::string(kArchivePath) + "/inside/file", "in the way");
+    ASSERT_EQ(0, chmod(root.Path(kGenDir).c_str(), 0755));
     EXPECT_EQ(c.members, ExportedMembers(root, c.set));
     for (const char* path : store) {
       bool handed_out = false;
