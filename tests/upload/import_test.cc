@@ -50,31 +50,42 @@ class CertificateImport : public testing::Test {
 
 }  // namespace
 
-// With marks and an intermediate; an EC set without one, which removes the
-// old one. The services restart in the import's
-// order once the store holds the new certificate.
+// With marks and an intermediate; a certificate file that also holds its
+// key, whose key block never reaches the readable certificate file; an EC
+// set without an intermediate, which removes the old one. The services
+// restart in the import's order once the store holds the new certificate,
+// and a good set logs nothing.
 TEST_F(CertificateImport, InstallsWholeSetsWithoutByteOrderMarksAndActivatesThem) {
   ASSERT_TRUE(MakeSelfSignedCa(Outside("ec.key"), Outside("ec.crt"), "/CN=ec", 0, KeyType::kEc));
   for (const char* service : {"webdav-httpd-ssl", "ftpd-ssl"}) {
     root_.WriteScript(std::string("/usr/orva/etc/services/") + service,
-                      "cmp -s \"$ORVA_ROOT/it's an upload/cert_tmp\" \"$ORVA_ROOT" +
+                      "cmp -s \"$ORVA_ROOT/expected.crt\" \"$ORVA_ROOT" +
                           std::string(kServerCrtPath) + "\" && echo " + service +
                           " >> \"$ORVA_ROOT/events\"");
   }
-  const struct { const char *cert, *key, *inter; } rounds[] = {
-      {"server.crt", "rsa.key", "server-ca.crt"}, {"ec.crt", "ec.key", nullptr}};
+  const struct { const char *cert, *key, *inter; bool key_in_cert; } rounds[] = {
+      {"server.crt", "rsa.key", "server-ca.crt", false},
+      {"server.crt", "server.key", "server-ca.crt", true},
+      {"ec.crt", "ec.key", nullptr, false}};
   for (const auto& round : rounds) {
     SCOPED_TRACE(round.cert);
     const std::string cert = ReadFile(Outside(round.cert)), key = ReadFile(Outside(round.key));
-    std::map<std::string, std::string> uploads = {{"cert_tmp", "\xEF\xBB\xBF" + cert},
-                                                  {"key_tmp", "\xEF\xBB\xBF" + key}};
-    if (round.inter) uploads["inter_cert_tmp"] = ReadFile(Outside(round.inter));
+    std::map<std::string, std::string> uploads = {
+        {"cert_tmp", "\xEF\xBB\xBF" + cert + (round.key_in_cert ? key : "")},
+        {"key_tmp", "\xEF\xBB\xBF" + key}};
+    if (round.inter) uploads["inter_cert_tmp"] = ReadFile(Outside(round.inter)) + key;
+    root_.WriteFile("/expected.crt", cert);
+    LogCapture log;
     ASSERT_EQ(ORVA::APIResponse::Outcome::kSuccess, Import(uploads).outcome());
+    EXPECT_EQ("", log.Text());
     EXPECT_EQ(cert, ReadFile(root_.Path(kServerCrtPath)));
     EXPECT_EQ(key, ReadFile(root_.Path(kServerKeyPath)));
     EXPECT_EQ(0400, FileMode(root_.Path(kServerKeyPath))) << "never the upload's 0600";
     EXPECT_EQ(0644, FileMode(root_.Path(kServerCrtPath)));
     EXPECT_EQ(round.inter ? 0644 : -1, FileMode(root_.Path(kInterCrtPath)));
+    if (round.inter) {
+      EXPECT_EQ(ReadFile(Outside(round.inter)), ReadFile(root_.Path(kInterCrtPath)));
+    }
     EXPECT_EQ("webdav-httpd-ssl\nftpd-ssl\n", ReadFile(root_.Path("/events")));
     std::remove(root_.Path("/events").c_str());
     ExpectStoreWhole(root_, before_);
