@@ -51,8 +51,8 @@ class CertificateImport : public testing::Test {
 }  // namespace
 
 // With marks and an intermediate; an EC set without one, which removes the
-// old one. The services restart in the import's
-// order once the store holds the new certificate.
+// old one. The services restart in the import's order once the store holds
+// the new certificate.
 TEST_F(CertificateImport, InstallsWholeSetsWithoutByteOrderMarksAndActivatesThem) {
   ASSERT_TRUE(MakeSelfSignedCa(Outside("ec.key"), Outside("ec.crt"), "/CN=ec", 0, KeyType::kEc));
   for (const char* service : {"webdav-httpd-ssl", "ftpd-ssl"}) {
