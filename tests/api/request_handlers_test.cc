@@ -34,9 +34,7 @@ Json::Value BothSubjects() {
 // The key length comes as text; one that does not fit 32 bits is no size.
 TEST(CsrCreate, LeavesAPrivatePendingPairThatAFailureKeeps) {
   TempDeviceRoot root;
-  Json::Value params = SubjectParams();
-  params["key_length"] = "1024";
-  const ORVA::APIResponse response = CallMethod(doCertificateCreateCSR_v1, params).response;
+  const ORVA::APIResponse response = CallCreateCsr();
   ASSERT_EQ(Outcome::kSuccess, response.outcome()) << response.error_code();
   EXPECT_EQ(Json::Value(Json::objectValue), response.data());
   EXPECT_EQ(0700, FileMode(root.Path(kGenDir)));
@@ -44,16 +42,14 @@ TEST(CsrCreate, LeavesAPrivatePendingPairThatAFailureKeeps) {
   EXPECT_TRUE(Shows(root.Path(kGenCsrPath), "Public-Key: (1024 bit)"));
   const StoreState pending = ReadStore(root);
   ExpectStoreWhole(root, {});
+  Json::Value params = SubjectParams();
   params["key_length"] = "4294968320";  // 2^32 + 1024
   EXPECT_EQ(5501, CallMethod(doCertificateCreateCSR_v1, params).response.error_code());
   EXPECT_EQ(CertificateFiles(pending), CertificateFiles(ReadStore(root)));
 }
 
-TEST(CsrRenew, RepeatsTheInstalledSubjectAndKeySizeAndNeedsACertificate) {
-  TempDeviceRoot root;
-  root.WriteFile(kServerCrtPath, "no certificate here\n");
-  EXPECT_EQ(5501, CallRenew().error_code());
-  EXPECT_FALSE(FileExists(root.Path(kGenKeyPath)));
+// An RSA key's size is kept; another kind of key gives 2048 bits.
+TEST(CsrRenew, RepeatsTheInstalledSubjectAndKeySize) {
   const struct { const char *subject, *shown; int bits; KeyType type; const char* renewed; }
   cases[] = {
       {"/C=DE/O=Org/CN=nas.local", "C=DE, O=Org, CN=nas.local", 1536, KeyType::kRsa, "(1536 bit)"},
@@ -61,6 +57,7 @@ TEST(CsrRenew, RepeatsTheInstalledSubjectAndKeySizeAndNeedsACertificate) {
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(c.subject);
+    TempDeviceRoot root;
     ASSERT_TRUE(MakeSelfSignedCa(root.Path(kServerKeyPath), root.Path(kServerCrtPath), c.subject,
                                  c.bits, c.type));
     ASSERT_EQ(Outcome::kSuccess, CallRenew().outcome());
@@ -71,30 +68,22 @@ TEST(CsrRenew, RepeatsTheInstalledSubjectAndKeySizeAndNeedsACertificate) {
   }
 }
 
+// Zero days are refused before the file is read.
 TEST(CsrSign, SignsAnUploadedRequestWithTheLocalCaAndRefusesWhatItCannotSign) {
   TempDeviceRoot root;
   const std::string csr = root.Path("/up/client.csr");
   ASSERT_TRUE(MakeRequest(root.Path("/up/client.key"), csr, "/CN=client", 1024));
   root.WriteFile("/up/certificate.pem", "-----BEGIN CERTIFICATE-----\n");
-  auto sign = [](const std::string& path, const char* days) {
-    Json::Value params(Json::objectValue);
-    params["csr"] = "client.csr";
-    params["csr_tmp"] = path;
-    params["days"] = days;
-    return CallMethod(doCertificateSign_v1, params).response;
-  };
-  const struct { std::string path; const char* days; int code; } refused[] = {
-      {root.Path("/missing.csr"), "0", 5503},
-      {root.Path("/up/certificate.pem"), "30", 5519},
-      {csr, "30", 5501},  // there is no local CA yet
-  };
-  for (const auto& c : refused) {
-    SCOPED_TRACE(c.path + " " + c.days);
-    EXPECT_EQ(c.code, sign(c.path, c.days).error_code());
-    EXPECT_FALSE(FileExists(root.Path(kGenCrtPath)));
-  }
+  Json::Value zero_days(Json::objectValue);
+  zero_days["csr"] = "client.csr";
+  zero_days["csr_tmp"] = root.Path("/missing.csr");
+  zero_days["days"] = "0";
+  EXPECT_EQ(5503, CallMethod(doCertificateSign_v1, zero_days).response.error_code());
+  EXPECT_EQ(5519, CallSign(root.Path("/up/certificate.pem")).error_code());
+  EXPECT_EQ(5501, CallSign(csr).error_code()) << "there is no local CA yet";
+  EXPECT_FALSE(FileExists(root.Path(kGenCrtPath)));
   ASSERT_TRUE(MakeSelfSignedCa(root.Path(kCaKeyPath), root.Path(kCaCrtPath), "/CN=Root", 1024));
-  const ORVA::APIResponse response = sign(csr, "30");
+  const ORVA::APIResponse response = CallSign(csr);
   ASSERT_EQ(Outcome::kSuccess, response.outcome()) << response.error_code();
   EXPECT_EQ(Json::Value(Json::objectValue), response.data());
   EXPECT_TRUE(RunForTest("openssl verify -CAfile '" + root.Path(kCaCrtPath) + "' '" +
@@ -113,16 +102,25 @@ TEST(CrtCreate, RefusesBadSubjectsAndNamesOrInstallsAVerifiableSetAndActivatesIt
     root.WriteScript(std::string("/usr/orva/etc/services/") + service,
                      std::string("echo ") + service + " >> \"$ORVA_ROOT/ran\"");
   }
-  const struct { const char *field, *value; int code; } refused[] = {
-      {"ca_country", "TWN", 5503},
-      {"country", "T", 5501},
-      {"organization", "Evil\nextensions = x", 5501},
-      {"alias", "nas.local,DNS:evil", 5501},
+  std::string many_names;
+  for (int i = 0; i <= 100; ++i) many_names += "n" + std::to_string(i) + ".local;";
+  const std::string long_name(65, 'a');
+  // Everything the tool would refuse is refused first, in the steps' order:
+  // the CA's key size before the CA's subject.
+  const struct { const char *field, *value, *also; int code; } refused[] = {
+      {"ca_country", "TWN", "", 5503},
+      {"ca_key_length", "0", "ca_country", 5501},
+      {"country", "T", "", 5501},
+      {"common_name", long_name.c_str(), "", 5501},
+      {"organization", "Evil\nextensions = x", "", 5501},
+      {"alias", "nas.local,DNS:evil", "", 5501},
+      {"alias", many_names.c_str(), "", 5501},
   };
   for (const auto& c : refused) {
-    SCOPED_TRACE(std::string(c.field) + "=" + c.value);
+    SCOPED_TRACE(std::string(c.field) + "=" + std::string(c.value).substr(0, 40));
     Json::Value params = BothSubjects();
     params[c.field] = c.value;
+    if (*c.also != '\0') params[c.also] = "TWN";
     EXPECT_EQ(c.code, CallMethod(doCertificateCreateCRT_v1, params).response.error_code());
     EXPECT_EQ(CertificateFiles(before), CertificateFiles(ReadStore(root)));
     EXPECT_FALSE(FileExists(root.Path("/ran")));

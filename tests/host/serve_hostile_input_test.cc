@@ -129,6 +129,10 @@ TEST_F(ServeTest, NoHostileValueReachesAShellAndEveryArgumentArrivesWhole) {
     for (const Method& method : kMethods) {
       SCOPED_TRACE(testing::Message() << method.method << " (" << method.texts << "), value " << i);
       Json::Value answer = Call(server, fixtures, method, values[i], i % 2 == 0);
+      // A file name is only text to the module; no multipart header holds a line break.
+      if (method.method == std::string("import") && values[i].find('\n') == std::string::npos) {
+        EXPECT_TRUE(answer["success"].asBool()) << "an import under any file names";
+      }
       if (!method.makes_server_subject || answer["success"] != true) continue;
       auto listed = server.AuthorizedClient().Get(
           "/webapi?api=ORVA.Core.Certificate&method=list&type=server_cert");

@@ -3,12 +3,11 @@
 
 #include <string>
 
-// PEM fixtures made with the machine's openssl tool: the one place tests
-// make keys, requests and certificates. Paths are real paths (already under
-// a device root); missing folders are made. Each returns true on success.
-// Keys are written as the tool writes them ("BEGIN PRIVATE KEY").
+// PEM fixtures made with the machine's openssl tool, the one place tests
+// make them. Paths are real paths (under a device root); missing folders are
+// made. Each returns true on success. Keys are written as the tool writes
+// them ("BEGIN PRIVATE KEY"): RSA or DSA of `bits`, or EC on P-256.
 
-// RSA of `bits`, EC on P-256 (`bits` unused), or DSA of `bits`.
 enum class KeyType { kRsa, kEc, kDsa };
 
 // A self-signed CA certificate for `subject` with a new key.
@@ -26,10 +25,9 @@ bool MakeSignedCertificate(const std::string& caKeyPath, const std::string& caCe
 bool MakeRequest(const std::string& keyPath, const std::string& csrPath,
                  const std::string& subject, int bits = 2048);
 
-// An issuing chain in `folder`: root.key and root.crt ("/CN=Root"),
-// inter.key and inter.crt ("/CN=Intermediate", issued by the root), and
-// server.key and server.crt (`subject`, issued by the intermediate), all
-// RSA keys of `bits`.
+// An issuing chain of RSA keys of `bits` in `folder`: root.key, root.crt
+// ("/CN=Root"); inter.key, inter.crt ("/CN=Intermediate", by the root);
+// server.key, server.crt (`subject`, by the intermediate).
 bool MakeChain(const std::string& folder, const std::string& subject, int bits = 1024);
 
 // Runs a shell command line for test set-up, without input or output;
