@@ -71,6 +71,20 @@ TEST(CertificateList, ListsTheStoreFilesAsTheyAreNowAndAnswersForMissingOnes) {
   EXPECT_EQ("Test Root", all[2]["subject"]["common_name"].asString());
   EXPECT_EQ("nas.local", all[3]["subject"]["common_name"].asString());
 
+  // Names of every string type arrive as UTF-8; a file lists at most 64
+  // certificates.
+  ASSERT_TRUE(RunForTest("cd '" + root.root() + "' && printf '[req]\\ndistinguished_name=dn\\n"
+                         "string_mask=default\\n[dn]\\n' >bmp.cfg && openssl req -x509 -newkey "
+                         "rsa:1024 -nodes -keyout bmp.key -out bmp.crt -config bmp.cfg -utf8 "
+                         "-subj '/CN=\xE6\x97\xA5\xE6\x9C\xAC/O=Z\xC3\xBCrich'"));
+  std::string many;
+  for (int i = 0; i < 66; ++i) many += ReadFile(root.Path("/bmp.crt"));
+  root.WriteFile(kInterCrtPath, many);
+  const Json::Value named = List(R"({"type":"inter_cert"})");
+  ASSERT_EQ(64u, named.size());
+  EXPECT_EQ(Parse(R"({"common_name":"\u65e5\u672c","organization":"Z\u00fcrich"})"),
+            named[63]["subject"]);
+
   // Decoded certificates are reused only while their file holds the same
   // bytes: a file rewritten in place (same inode, nearly the same time) is
   // listed with its new content at once.

@@ -20,15 +20,9 @@ namespace {
 
 using Outcome = ORVA::APIResponse::Outcome;
 
-// The keys, certificates and requests a failed call keeps. CRT create
-// installs the new CA before it makes the server pair, so a later failure
-// keeps the new CA, which ExpectStoreWhole proves whole and matching.
-std::map<std::string, std::string> KeptFiles(const std::string& writer, const StoreState& state) {
-  std::map<std::string, std::string> files = CertificateFiles(state);
-  if (writer == "CRT create") {
-    for (const char* ca : {"ssl.key/ca.key", "ssl.crt/ca.crt", "ssl.csr/ca.csr"}) files.erase(ca);
-  }
-  return files;
+// The keys, certificates and requests a failed call keeps: all of them.
+std::map<std::string, std::string> KeptFiles(const std::string&, const StoreState& state) {
+  return CertificateFiles(state);
 }
 
 // What every row proves once the writer `name` gave `response` with a
@@ -192,5 +186,26 @@ TEST_F(StoreFaults, FileInPlaceOfAFolderFailsItsWriters) {
     const StoreWriter writer = StoreWriters().at(name);
     ExpectFaultHandled(root_, state, name, writer.call(root_), writer.write_error);
     EXPECT_EQ("not a folder\n", ReadFile(root_.Path(std::string(kStore) + "/" + folder)));
+  }
+}
+
+// A rename that fails at any step of a set's install (a folder in the way
+// of one target) puts back every file the set had replaced.
+TEST_F(StoreFaults, RenameFailingAtAnyStepPutsTheOldSetBack) {
+  const std::pair<const char*, const char*> cases[] = {
+      {"ssl.csr/ca.csr", "CRT create"},     {"ssl.crt/ca.crt", "CRT create"},
+      {"ssl.crt/server.crt", "CRT create"}, {"ssl.key/ca.key", "CRT create"},
+      {"ssl.key/server.key", "CRT create"}, {"ssl.intercrt/server-ca.crt", "CRT create"},
+      {".gen/server.csr", "CSR create"},    {".gen/server.key", "CSR create"},
+      {"ssl.crt/server.crt", "import"},     {"ssl.intercrt/server-ca.crt", "import"},
+  };
+  for (const auto& [target, name] : cases) {
+    SCOPED_TRACE(std::string(name) + " with a folder at " + target);
+    StoreState state = before_;
+    state.erase(target);
+    state[std::string(target) + "/inside"] = {"in the way\n", 0644};
+    RestoreStore(root_, state);
+    const StoreWriter writer = StoreWriters().at(name);
+    ExpectFaultHandled(root_, state, name, writer.call(root_), writer.write_error);
   }
 }

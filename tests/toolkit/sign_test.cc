@@ -1,5 +1,7 @@
 // The local CA, the certificates it signs, and its serial file.
 
+#include <unistd.h>
+
 #include <cstdio>
 #include <string>
 
@@ -34,6 +36,11 @@ TEST(GenServerCrt, LocalCaSignsVerifiableCertificatesNamingEachAliasAndRefusesOt
       {"nas.local;;*.example.com;my_host-2", "DNS:nas.local, DNS:*.example.com, DNS:my_host-2\n"},
       {"192.168.1.10;fe80::1", "IP Address:192.168.1.10, IP Address:FE80:0:0:0:0:0:0:1\n"},
   };
+  // The serial file is replaced, never written through a link out of the
+  // store.
+  const std::string serial = root.Path(kSerialPath);
+  root.WriteFile("/outside/serial", "0A\n");
+  ASSERT_EQ(0, symlink(root.Path("/outside/serial").c_str(), serial.c_str()));
   for (const auto& c : accepted) {
     SCOPED_TRACE(c.aliases);
     ASSERT_EQ(0, sign(c.aliases));
@@ -48,6 +55,8 @@ TEST(GenServerCrt, LocalCaSignsVerifiableCertificatesNamingEachAliasAndRefusesOt
     EXPECT_EQ(-1, sign(std::string("ok;") + alias));
     EXPECT_TRUE(log.Contains(" Alias 2 is neither a host name nor an IP address\n")) << log.Text();
   }
+  EXPECT_EQ("0A\n", ReadFile(root.Path("/outside/serial")));
+  EXPECT_EQ("0C\n", ReadFile(serial)) << "advanced once per certificate";
   EXPECT_EQ(-1, sign("", 0));
   EXPECT_EQ(signed_last, ReadFile(out));
   ExpectStoreWhole(root, {});
