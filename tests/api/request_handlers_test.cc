@@ -130,8 +130,9 @@ TEST(CrtCreate, RefusesBadSubjectsAndNamesOrInstallsAVerifiableSetAndActivatesIt
   ASSERT_EQ(Outcome::kSuccess, CallMethod(doCertificateCreateCRT_v1, params).response.outcome());
   EXPECT_TRUE(RunForTest("openssl verify -CAfile '" + root.Path(kCaCrtPath) + "' '" +
                          root.Path(kServerCrtPath) + "'"));
-  EXPECT_TRUE(Shows(root.Path(kServerCrtPath), "Issuer: C=TW, ST=Taipei, L=Neihu, O=Storage Works, "
-                                               "OU=Lab, CN=Local Root/emailAddress=admin@new.local\n"))
+  EXPECT_TRUE(Shows(root.Path(kServerCrtPath),
+                    "Issuer: C=TW, ST=Taipei, L=Neihu, O=Storage Works, OU=Lab, "
+                    "CN=Local Root/emailAddress=admin@new.local\n"))
       << PemText(root.Path(kServerCrtPath));
   EXPECT_TRUE(Shows(root.Path(kServerCrtPath), "Public-Key: (2048 bit)"));
   EXPECT_TRUE(Shows(root.Path(kCaCrtPath), "Public-Key: (1024 bit)"));

@@ -14,20 +14,8 @@ TEST(Log, PrefixesFileAndLineAndAppendsTheLastErrorOnRequest) {
   const std::string line = std::to_string(__LINE__ + 2);
   errno = ENOENT;
   ORVA_LOG("%s failed.(errno:%d/%m)", "mkdir", errno);
-<<<<<<< HEAD
-  ORVA_LOG_LASTERR("Open %s failed", "/usr/orva/etc/ssl/cfg.d/ca.cfg");
-  ORVA_LOG_LASTERR_AS("/src/upload/caller.cc", 4242, "Fail to do certificate plugin init ");
-  EXPECT_EQ("orva-test: log_test.cc:" + std::to_string(line) +
-                " mkdir failed.(errno:2/No such file or directory)\n"
-                "orva-test: log_test.cc:" + std::to_string(line + 1) +
-                " Open /usr/orva/etc/ssl/cfg.d/ca.cfg failed[0x002A olib_file.cc:77]\n"
-                "orva-test: caller.cc:4242"
-                " Fail to do certificate plugin init [0x002A olib_file.cc:77]\n",
-=======
-  ORVA_LOG_LASTERR_AS("/src/upload/caller.cc", "Open %s failed", "ca.cfg");
+  ORVA_LOG_LASTERR_AS("/src/upload/caller.cc", 4242, "Open %s failed", "ca.cfg");
   EXPECT_EQ("orva-test: log_test.cc:" + line + " mkdir failed.(errno:2/No such file or directory)\n"
-            "orva-test: caller.cc:" + std::to_string(std::stoi(line) + 1) +
-                " Open ca.cfg failed[0x002A olib_file.cc:77]\n",
->>>>>>> main
+            "orva-test: caller.cc:4242 Open ca.cfg failed[0x002A olib_file.cc:77]\n",
             log.Text());
 }

@@ -24,7 +24,8 @@ TEST(OlibPlugin, ActionRunsEveryPluginOfTheGroupInNameOrderDespiteFailures) {
   TempDeviceRoot root;
   const std::string group = "/usr/orva/etc/plugins/certificate/";
   root.WriteScript(group + "20-second", "echo \"second $1 $2\" >> \"$ORVA_ROOT/plugins.log\"");
-  root.WriteScript(group + "10-first", "echo \"first $1 $2\" >> \"$ORVA_ROOT/plugins.log\"; exit 1");
+  root.WriteScript(group + "10-first",
+                   "echo \"first $1 $2\" >> \"$ORVA_ROOT/plugins.log\"; exit 1");
   OLIBPLUGIN_HANDLE handle = nullptr;
   ASSERT_EQ(0, OLIBPluginSDKInit("certificate", "certificate/change", &handle));
   EXPECT_LT(OLIBPluginAction(5, handle), 0) << "one plug-in failed";

@@ -35,7 +35,8 @@ TEST(GenKey, OnlyAWholeKeyFromAToolThatSucceededReplacesTheOldKey) {
     ASSERT_TRUE(MakeRequest(root.Path("/new.key"), root.Path("/new.csr"), "/CN=new", 1024));
     root.WriteScript("/usr/orva/bin/openssl",
                      "for arg; do\n  if [ \"$previous\" = -out ]; then " + std::string(c.output) +
-                         " > \"$arg\"; fi\n  previous=$arg\ndone\nexit " + std::to_string(c.status));
+                         " > \"$arg\"; fi\n  previous=$arg\ndone\nexit " +
+                         std::to_string(c.status));
     const std::string old_key = ReadFile(key);
     const StoreState before = ReadStore(root);
     EXPECT_EQ(c.replaced ? 0 : -1, genKey(key.c_str(), 1024));

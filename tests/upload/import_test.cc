@@ -53,16 +53,17 @@ bool WriteKeyWithWrongPrivatePart(const std::string& from, const std::string& to
   return out && PEM_write_PrivateKey(out.get(), wrong, nullptr, nullptr, 0, nullptr, nullptr) == 1;
 }
 
-// A store with an old set, and uploads made beside InstallOldStore's
-// outside set, with the server key also in its traditional form
-// ("BEGIN RSA PRIVATE KEY"), which the tool compares.
+// A store with an old set, and uploads beside InstallOldStore's outside
+// set: the server key also in the traditional form ("BEGIN RSA PRIVATE
+// KEY", which the tool compares), plain and encrypted.
 class CertificateImport : public testing::Test {
  protected:
   void SetUp() override {
     ASSERT_NO_FATAL_FAILURE(InstallOldStore(root_));
     before_ = ReadStore(root_);
-    for (const char* rewrite : {"server.key -traditional -out rsa.key",
-                                "server.key -traditional -aes128 -passout pass:x -out locked.key"}) {
+    for (const char* rewrite :
+         {"server.key -traditional -out rsa.key",
+          "server.key -traditional -aes128 -passout pass:x -out locked.key"}) {
       ASSERT_TRUE(RunForTest("cd '" + Outside("") + "' && openssl pkey -in " + rewrite));
     }
   }
