@@ -52,6 +52,7 @@ CertificateFactsList DecodeCertificateFacts(const std::string& pem) {
     if (algorithm != nullptr) facts.signature_algorithm = algorithm;
     ASN1_TIME2Json(X509_get0_notBefore(certificate.get()), facts.valid_from);
     ASN1_TIME2Json(X509_get0_notAfter(certificate.get()), facts.valid_till);
+    facts.certificate.reset(certificate.release(), X509_free);
     list.push_back(std::move(facts));
   }
   return list;

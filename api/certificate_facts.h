@@ -6,6 +6,7 @@
 #include <vector>
 
 #include <json/json.h>
+#include <openssl/x509.h>
 
 // What a certificate entry shows of one certificate, decoded once.
 struct CertificateFacts {
@@ -14,6 +15,9 @@ struct CertificateFacts {
   std::string signature_algorithm;  // long name; "" when it has none
   Json::Value valid_from;  // the printed time, or null when none was printed
   Json::Value valid_till;
+  // The certificate itself, for what is worked out only when asked for
+  // (names, key, fingerprint, compatibility); never null. Only read.
+  std::shared_ptr<X509> certificate;
 };
 
 using CertificateFactsList = std::vector<CertificateFacts>;

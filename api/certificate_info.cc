@@ -6,9 +6,13 @@
 #include <openssl/x509.h>
 
 #include <cstdio>
+#include <ctime>
 #include <memory>
+#include <vector>
 
+#include "api/certificate_details.h"
 #include "api/certificate_facts.h"
+#include "api/compatibility.h"
 #include "common/file_util.h"
 #include "common/log.h"
 #include "common/raii.h"
@@ -38,6 +42,47 @@ const char* FileType(const std::string& path) {
   if (path == OrvaPath(kServerCrtPath)) return "server_cert";
   if (path == OrvaPath(kInterCrtPath)) return "inter_cert";
   return nullptr;
+}
+
+// What the request's "additional" array asks for, read once however long
+// the array is.
+struct Additional {
+  bool valid_from = false;
+  bool valid_till = false;
+  bool names = false;
+  bool key = false;
+  bool fingerprint = false;
+  bool compatibility = false;
+};
+
+Additional ReadAdditional(ORVA::APIRequest* request) {
+  Additional asked;
+  Json::Value additional =
+      request != nullptr ? request->GetParam("additional", Json::Value()) : Json::Value();
+  if (!additional.isArray()) return asked;
+  const struct {
+    const char* name;
+    bool Additional::*flag;
+  } kFields[] = {
+      {"valid_from", &Additional::valid_from}, {"valid_till", &Additional::valid_till},
+      {"names", &Additional::names},           {"key", &Additional::key},
+      {"fingerprint", &Additional::fingerprint},
+      {"compatibility", &Additional::compatibility},
+  };
+  for (const Json::Value& element : additional) {
+    for (const auto& field : kFields) {
+      if (element == Json::Value(field.name)) asked.*field.flag = true;
+    }
+  }
+  return asked;
+}
+
+// The facts of the store file at `devicePath`; none when it cannot be read.
+std::shared_ptr<const CertificateFactsList> StoreFileFacts(const char* devicePath) {
+  const std::string path = OrvaPath(devicePath);
+  std::string pem;
+  if (!ReadWholeFile(path, &pem)) return std::make_shared<const CertificateFactsList>();
+  return CertificateFactsOf(path, pem);
 }
 
 }  // namespace
@@ -71,18 +116,7 @@ void ASN1_TIME2Json(const ASN1_TIME* time, Json::Value& value) {
 
 int getCertificateInfo(const std::string& path, Json::Value& entries,
                        ORVA::APIRequest* request) {
-  // The asked-for fields are read once, however long the list.
-  bool valid_from = false;
-  bool valid_till = false;
-  Json::Value additional =
-      request != nullptr ? request->GetParam("additional", Json::Value())
-                         : Json::Value();
-  if (additional.isArray()) {
-    for (const Json::Value& element : additional) {
-      valid_from = valid_from || element == Json::Value("valid_from");
-      valid_till = valid_till || element == Json::Value("valid_till");
-    }
-  }
+  const Additional asked = ReadAdditional(request);
   std::string pem;
   if (!ReadWholeFile(path, &pem)) return 4;
   std::shared_ptr<const CertificateFactsList> facts = CertificateFactsOf(path, pem);
@@ -93,14 +127,30 @@ int getCertificateInfo(const std::string& path, Json::Value& entries,
              path.c_str(), kMaxListedCertificates);
   }
   const char* type = FileType(path);
+  // A certificate's issuer is among those the device presents with it or
+  // its local CA.
+  std::vector<std::shared_ptr<const CertificateFactsList>> presented;
+  std::vector<X509*> issuers;
+  if (asked.compatibility) {
+    presented = {facts, StoreFileFacts(kInterCrtPath), StoreFileFacts(kCaCrtPath)};
+    for (const auto& file : presented) {
+      for (const CertificateFacts& certificate : *file) issuers.push_back(certificate.certificate.get());
+    }
+  }
+  const time_t now = std::time(nullptr);
   for (size_t i = 0; i < listed; ++i) {
     const CertificateFacts& certificate = (*facts)[i];
     Json::Value entry(Json::objectValue);
     entry["issuer"] = certificate.issuer;
     entry["subject"] = certificate.subject;
     entry["signature_algorithm"] = certificate.signature_algorithm;
-    if (valid_from) entry["valid_from"] = certificate.valid_from;
-    if (valid_till) entry["valid_till"] = certificate.valid_till;
+    X509* x509 = certificate.certificate.get();
+    if (asked.valid_from) entry["valid_from"] = certificate.valid_from;
+    if (asked.valid_till) entry["valid_till"] = certificate.valid_till;
+    if (asked.names) entry["names"] = AltNamesJson(x509);
+    if (asked.key) entry["key"] = KeyJson(x509);
+    if (asked.fingerprint) entry["fingerprint"] = Sha256Fingerprint(x509);
+    if (asked.compatibility) entry["compatibility"] = CompatibilityVerdict(x509, issuers, now);
     if (type != nullptr) entry["type"] = type;
     entries.append(entry);
   }

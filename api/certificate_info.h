@@ -12,8 +12,12 @@
 
 // Appends one certificate entry per PEM certificate of the file at `path`
 // to `entries` (an array, or null, which becomes an array on the first
-// append): "issuer", "subject", "signature_algorithm", "valid_from" and
-// "valid_till" when the request's "additional" array names them, and "type"
+// append): "issuer", "subject", "signature_algorithm"; "valid_from",
+// "valid_till", "names" (AltNamesJson), "key" (KeyJson), "fingerprint"
+// (Sha256Fingerprint) and "compatibility" (CompatibilityVerdict, with the
+// certificates of the same file, the installed intermediate file and the
+// local CA as possible issuers) when the request's "additional" array
+// names them; and "type"
 // when `path` is one of the three store certificate files under the device
 // root. Reading stops quietly at the first block that does not decode, and
 // after kMaxListedCertificates entries (logged: the rest are not listed).

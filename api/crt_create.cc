@@ -16,7 +16,9 @@
 
 namespace {
 
-constexpr int kServerValidityDays = 3650;
+// The longest validity Apple's clients accept for a server certificate;
+// the local CA keeps its ten years.
+constexpr int kServerValidityDays = 825;
 
 // The server request lives only while the certificate is signed, under a
 // name of its own, so a pending request of CSR create is never touched.
@@ -47,7 +49,7 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
   // Everything the steps would refuse is refused before the first file is
   // written, in the order the steps would meet it: the CA's key size, the
   // CA's subject, the server's key size, its subject and the names.
-  if (!IsAcceptedKeySize(static_cast<unsigned int>(ca_key_length))) {
+  if (checkKeySize(static_cast<unsigned int>(ca_key_length)) != 0) {
     ORVA_LOG("Generate CA key & crt failed");
     return kErrFailed;
   }
@@ -55,7 +57,7 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
     ORVA_LOG("Generate CA key & crt failed");
     return kErrBadParameter;
   }
-  if (!IsAcceptedKeySize(static_cast<unsigned int>(key_length))) {
+  if (checkKeySize(static_cast<unsigned int>(key_length)) != 0) {
     ORVA_LOG("Generate server key failed");
     return kErrFailed;
   }
@@ -63,7 +65,7 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
     ORVA_LOG("Generate csr failed");
     return kErrFailed;
   }
-  if (checkAliasText(aliases.c_str()) != 0) {
+  if (checkServerNames(server_record.common_name.c_str(), aliases.c_str()) != 0) {
     ORVA_LOG("Generate crt failed");
     return kErrFailed;
   }

@@ -1,6 +1,7 @@
 #include <openssl/evp.h>
 #include <openssl/pem.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <string>
 
@@ -14,6 +15,7 @@
 #include "common/raii.h"
 #include "common/store_paths.h"
 #include "platform/olib/orva_root.h"
+#include "toolkit/key_strength.h"
 
 namespace {
 
@@ -52,8 +54,9 @@ void FillFromSubject(const Json::Value& subject, CSR_ARGUMENT* record) {
 }
 
 // The key length of the first certificate of the installed server
-// certificate: the RSA modulus size, or 2048 for another key type.
-// Returns false (logged) when it cannot be read.
+// certificate: the RSA modulus size, raised to the smallest size keys are
+// made with, or 2048 for another key type. Returns false (logged) when it
+// cannot be read.
 bool InstalledKeyLength(int* bits) {
   FilePtr file(std::fopen(OrvaPath(kServerCrtPath).c_str(), "r"));
   if (!file) {
@@ -70,8 +73,9 @@ bool InstalledKeyLength(int* bits) {
     ORVA_LOG_LASTERR("get public key from file failed");
     return false;
   }
-  *bits = EVP_PKEY_base_id(key.get()) == EVP_PKEY_RSA ? EVP_PKEY_get_bits(key.get())
-                                                      : kDefaultKeyLength;
+  *bits = EVP_PKEY_base_id(key.get()) == EVP_PKEY_RSA
+              ? std::max(EVP_PKEY_get_bits(key.get()), kMinRsaKeyBits)
+              : kDefaultKeyLength;
   return true;
 }
 

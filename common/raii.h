@@ -5,6 +5,7 @@
 #include <openssl/bio.h>
 #include <openssl/evp.h>
 #include <openssl/x509.h>
+#include <openssl/x509v3.h>
 
 #include <cstdio>
 #include <memory>
@@ -30,6 +31,16 @@ struct X509NameDeleter {
   void operator()(X509_NAME* name) const { X509_NAME_free(name); }
 };
 using X509NamePtr = std::unique_ptr<X509_NAME, X509NameDeleter>;
+
+struct X509ReqDeleter {
+  void operator()(X509_REQ* request) const { X509_REQ_free(request); }
+};
+using X509ReqPtr = std::unique_ptr<X509_REQ, X509ReqDeleter>;
+
+struct GeneralNamesDeleter {
+  void operator()(GENERAL_NAMES* names) const { GENERAL_NAMES_free(names); }
+};
+using GeneralNamesPtr = std::unique_ptr<GENERAL_NAMES, GeneralNamesDeleter>;
 
 struct BioDeleter {
   void operator()(BIO* bio) const { BIO_free(bio); }

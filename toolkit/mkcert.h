@@ -9,6 +9,7 @@
 #include "platform/olib/olib_szlist.h"
 #include "platform/olib/olib_types.h"
 #include "toolkit/csr_argument.h"
+#include "toolkit/request_facts.h"
 #include "toolkit/store_file.h"
 
 // The certificate toolkit: keys, requests and certificates made with the
@@ -39,12 +40,14 @@ int genDir(const char* path);
 
 // Makes a new RSA key of `bits` bits at `keyPath`, mode 0400, replacing an
 // existing file even when it is read-only. 0 on success; -1 (logged) for a
-// null or empty path, a size of 0 or above 16384, a directory that cannot
+// null or empty path, a size checkKeySize refuses, a directory that cannot
 // be made, or a tool failure.
 int genKey(const char* keyPath, unsigned int bits);
 
-// True for a key size genKey makes: 1 to 16384 bits.
-bool IsAcceptedKeySize(unsigned int bits);
+// 0 for a key size genKey makes: kMinRsaKeyBits (2048, the smallest the
+// device's own HTTPS can use) to 16384 bits; -1 (logged with the size)
+// otherwise.
+int checkKeySize(unsigned int bits);
 
 // Writes the request configuration at `configPath` from `subject` and makes
 // a request for the existing key `keyPath` at `requestPath` (mode 0400).
@@ -63,11 +66,13 @@ int genCsr(const char* configPath, const char* keyPath,
 // exactly 2 bytes, or a value holding a control character.
 int checkCsrSubject(const CSR_ARGUMENT* subject);
 
-// The alias rules of the server extension file, checked alone: 0 when every
-// non-empty name of the ";"-separated `aliases` (null counts as empty) is
-// an IPv4 or IPv6 literal or made of letters, digits, ".", "-", "_" and
-// "*"; -1 (logged with the name's position) otherwise.
-int checkAliasText(const char* aliases);
+// The name rules of the server extension file for a request whose common
+// name is `commonName`, checked alone: 0 when every non-empty name of the
+// ";"-separated `aliases` (null counts as empty) is an IPv4 or IPv6
+// literal or made of letters, digits, ".", "-", "_" and "*", and the
+// certificate would name at least one host (the common name is such a name,
+// or an alias is given); -1 (logged) otherwise.
+int checkServerNames(const char* commonName, const char* aliases);
 
 // Writes the CA serial file "/usr/orva/etc/ssl/.mkcert.serial": the time in
 // seconds, then the MAC address word from its ninth character on, cut to 31
@@ -79,13 +84,27 @@ int checkAliasText(const char* aliases);
 int genSerial();
 
 // Write the CA and the server extension file at `path`, replacing its
-// content. The server file names every non-empty item of `aliases` as
-// "IP:" for an IPv4 or IPv6 literal and "DNS:" otherwise. 0 on success; -1
-// (logged) for a null or empty path, a null list, a name that is neither an
-// address literal nor made of letters, digits, ".", "-", "_" and "*"
-// (refused before anything is written), or a directory or file failure.
-int generateCACNF(const char* path);
-int generateServerCNF(const char* path, OLIBSZLIST* aliases);
+// content. 0 on success; -1 (logged) for a null or empty path, a null list,
+// a refused name (before anything is written), or a directory or file
+// failure.
+//
+// The CA file: critical basic constraints (CA, path length 0), critical
+// key usage keyCertSign and cRLSign, a subject key identifier, and the
+// e-mail address as alternative name when `withEmail`.
+//
+// The server file: critical basic constraints (no CA), critical key usage
+// digitalSignature (and keyEncipherment unless `request` has an EC key),
+// extended key usage serverAuth, subject and authority key identifiers,
+// and one subjectAltName line: the request's common name when it is a
+// host name or an address literal, then every non-empty name of `aliases`
+// or, when it has none, the request's own DNS and IP names (those that
+// break the alias rule are left out, logged), each name once, "IP:" for an
+// IPv4 or IPv6 literal and "DNS:" otherwise, and the subject's e-mail
+// address last when it has one. Refused: an alias that is neither an
+// address literal nor made of letters, digits, ".", "-", "_" and "*", and
+// a certificate that would name no host.
+int generateCACNF(const char* path, bool withEmail);
+int generateServerCNF(const char* path, const RequestFacts& request, OLIBSZLIST* aliases);
 
 // Signs `requestPath` for `days` days (above 0). Self-signed (`selfSigned`
 // == TRUE): written to `caOrOutput`, signed with `keyPath`, with the CA
@@ -93,10 +112,12 @@ int generateServerCNF(const char* path, OLIBSZLIST* aliases);
 // `aliases` are unused. CA-signed (any other value): signed by the CA
 // certificate `caOrOutput` and CA key `keyPath`, serial from the existing
 // file `serialPath` (advanced by the tool), written to `outputPath`, with
-// the server extension file written at `extFile` from `aliases`
-// (";"-separated; null counts as empty). 0 on success with the certificate
-// at mode 0400; -1 (logged) otherwise. Checks run before anything is
-// written: arguments, request, key, then serial file and aliases.
+// the server extension file written at `extFile` from the request and
+// `aliases` (";"-separated; null counts as empty). Both extension files
+// are those of generateCACNF and generateServerCNF for the request. 0 on
+// success with the certificate at mode 0400; -1 (logged) otherwise. Checks
+// run before anything is written: arguments, request, key, then serial
+// file and names.
 int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,
            const char* serialPath, const char* outputPath, const char* keyPath,
            BOOL selfSigned, int days, const char* aliases);

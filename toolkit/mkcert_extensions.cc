@@ -4,6 +4,7 @@
 
 #include <cctype>
 #include <string>
+#include <vector>
 
 #include "common/log.h"
 #include "toolkit/mkcert.h"
@@ -12,20 +13,34 @@
 
 namespace {
 
-const char kCaExtensions[] =
+const char kExtensionsHead[] =
     "extensions = x509v3\n"
-    "[ x509v3 ]\n"
-    "subjectAltName   = email:copy\n"
-    "basicConstraints = CA:true,pathlen:0\n"
+    "[ x509v3 ]\n";
+
+// Strict verifiers want a CA's basic constraints critical and its key
+// usage naming certificate signing.
+const char kCaExtensions[] =
+    "basicConstraints = critical,CA:true,pathlen:0\n"
+    "keyUsage         = critical,keyCertSign,cRLSign\n"
+    "subjectKeyIdentifier = hash\n"
     "nsComment        = \"mod_ssl generated custom CA certificate\"\n"
     "nsCertType       = sslCA\n";
 
+// Apple's clients refuse a server certificate without serverAuth usage;
+// strict verifiers want the key identifiers.
 const char kServerExtensions[] =
-    "extensions = x509v3\n"
-    "[ x509v3 ]\n"
-    "subjectAltName   = email:copy\n"
-    "nsComment        = \"mod_ssl generated custom server certificate\"\n"
-    "nsCertType       = server\n";
+    "basicConstraints       = critical,CA:false\n"
+    "extendedKeyUsage       = serverAuth\n"
+    "subjectKeyIdentifier   = hash\n"
+    "authorityKeyIdentifier = keyid\n"
+    "nsComment              = \"mod_ssl generated custom server certificate\"\n"
+    "nsCertType             = server\n";
+
+// An EC key signs only; an RSA key also enciphers the key exchange of
+// clients that still use RSA key transport.
+const char kEcKeyUsage[] = "keyUsage               = critical,digitalSignature\n";
+const char kRsaKeyUsage[] =
+    "keyUsage               = critical,digitalSignature,keyEncipherment\n";
 
 bool IsAddressLiteral(const char* name) {
   unsigned char address[sizeof(struct in6_addr)];
@@ -51,23 +66,62 @@ bool IsAllowedAlias(const char* name) {
   return *name == '\0' || IsAddressLiteral(name) || IsHostName(name);
 }
 
-// The subjectAltName entries for the names of `aliases`, empty names
-// skipped. False (logged) when a name is neither an address literal nor a
-// host name.
-bool AliasEntries(const OLIBSZLIST* aliases, std::string* entries) {
-  const std::vector<const char*> names = ListItems(aliases);
-  for (size_t i = 0; i < names.size(); ++i) {
-    const char* name = names[i];
-    if (*name == '\0') continue;
-    if (!IsAllowedAlias(name)) {
+// Two names are the same when their keys are: host names compare without
+// case, address literals as the addresses they write.
+std::string NameKey(const char* name) {
+  unsigned char address[sizeof(struct in6_addr)] = {0};
+  if (inet_pton(AF_INET, name, address) == 1) return "4" + std::string(address, address + 4);
+  if (inet_pton(AF_INET6, name, address) == 1) return "6" + std::string(address, address + 16);
+  std::string key = "D";
+  for (const char* p = name; *p != '\0'; ++p) key += static_cast<char>(std::tolower(*p));
+  return key;
+}
+
+// The subjectAltName entries of a server certificate signed from `request`:
+// the common name when it is a host name or an address literal, then the
+// names of `aliases` or, when it names none, the request's own DNS and IP
+// names (one that breaks the alias rule is left out, logged), each name
+// once, and "email:copy" last when the subject holds an e-mail address.
+// False (logged) when an alias breaks the rule or no host name results.
+bool ServerNameEntries(const RequestFacts& request, const OLIBSZLIST* aliases,
+                       std::string* entries) {
+  std::vector<std::string> keys;
+  auto add = [&keys, entries](const char* name) {
+    const std::string key = NameKey(name);
+    for (const std::string& seen : keys) {
+      if (seen == key) return;
+    }
+    keys.push_back(key);
+    if (!entries->empty()) *entries += ", ";
+    *entries += IsAddressLiteral(name) ? "IP:" : "DNS:";
+    *entries += name;
+  };
+  const char* common_name = request.common_name.c_str();
+  if (*common_name != '\0' && IsAllowedAlias(common_name)) add(common_name);
+  const std::vector<const char*> given = ListItems(aliases);
+  bool aliased = false;
+  for (size_t i = 0; i < given.size(); ++i) {
+    if (*given[i] == '\0') continue;
+    if (!IsAllowedAlias(given[i])) {
       ORVA_LOG("Alias %zu is neither a host name nor an IP address", i + 1);
       return false;
     }
-    bool address = IsAddressLiteral(name);
-    if (!entries->empty()) *entries += ", ";
-    *entries += address ? "IP:" : "DNS:";
-    *entries += name;
+    add(given[i]);
+    aliased = true;
   }
+  for (size_t i = 0; !aliased && i < request.names.size(); ++i) {
+    const char* name = request.names[i].c_str();
+    if (*name == '\0' || !IsAllowedAlias(name)) {
+      ORVA_LOG("Request name %zu is neither a host name nor an IP address; left out", i + 1);
+      continue;
+    }
+    add(name);
+  }
+  if (keys.empty()) {
+    ORVA_LOG("The certificate would name no host: no alias, and the common name is no host name");
+    return false;
+  }
+  if (request.has_email) *entries += ", email:copy";
   return true;
 }
 
@@ -91,15 +145,17 @@ int WriteExtensionFile(const char* path, const std::string& text) {
 
 }  // namespace
 
-int generateCACNF(const char* path) {
+int generateCACNF(const char* path, bool withEmail) {
   if (path == nullptr || *path == '\0') {
     ORVA_LOG_LASTERR("CA CNF name is null or empty.");
     return -1;
   }
-  return WriteExtensionFile(path, kCaExtensions);
+  std::string text = kExtensionsHead;
+  if (withEmail) text += "subjectAltName   = email:copy\n";
+  return WriteExtensionFile(path, text + kCaExtensions);
 }
 
-int generateServerCNF(const char* path, OLIBSZLIST* aliases) {
+int generateServerCNF(const char* path, const RequestFacts& request, OLIBSZLIST* aliases) {
   if (path == nullptr || *path == '\0') {
     ORVA_LOG_LASTERR("Server CNF name is null or empty.");
     return -1;
@@ -109,22 +165,19 @@ int generateServerCNF(const char* path, OLIBSZLIST* aliases) {
     return -1;
   }
   std::string entries;
-  if (!AliasEntries(aliases, &entries)) return -1;
-  std::string text = kServerExtensions;
-  if (!entries.empty()) text += "subjectAltName = \"" + entries + "\"\n";
+  if (!ServerNameEntries(request, aliases, &entries)) return -1;
+  std::string text = kExtensionsHead;
+  text += request.ec_key ? kEcKeyUsage : kRsaKeyUsage;
+  text += kServerExtensions;
+  text += "subjectAltName         = \"" + entries + "\"\n";
   return WriteExtensionFile(path, text);
 }
 
-int checkAliasText(const char* aliases) {
-  if (aliases == nullptr) return 0;
-  OLIBSzListPtr names = SplitAliases(aliases);
+int checkServerNames(const char* commonName, const char* aliases) {
+  OLIBSzListPtr names = SplitAliases(aliases == nullptr ? "" : aliases);
   if (!names) return -1;
-  const std::vector<const char*> items = ListItems(names.get());
-  for (size_t i = 0; i < items.size(); ++i) {
-    if (!IsAllowedAlias(items[i])) {
-      ORVA_LOG("Alias %zu is neither a host name nor an IP address", i + 1);
-      return -1;
-    }
-  }
-  return 0;
+  RequestFacts request;
+  request.common_name = commonName == nullptr ? "" : commonName;
+  std::string entries;
+  return ServerNameEntries(request, names.get(), &entries) ? 0 : -1;
 }

@@ -7,6 +7,7 @@
 #include "common/file_util.h"
 #include "common/log.h"
 #include "common/shell_command.h"
+#include "toolkit/key_strength.h"
 #include "toolkit/mkcert.h"
 #include "toolkit/mkcert_internal.h"
 #include "toolkit/store_file.h"
@@ -46,12 +47,15 @@ int genDir(const char* path) {
   return MakeDirectories(DirectoryOf(path)) ? 0 : -1;
 }
 
-bool IsAcceptedKeySize(unsigned int bits) {
-  return bits != 0 && bits <= kMaxKeyBits;
+int checkKeySize(unsigned int bits) {
+  if (bits >= static_cast<unsigned int>(kMinRsaKeyBits) && bits <= kMaxKeyBits) return 0;
+  ORVA_LOG("Key size %u refused: RSA keys have %d to %u bits", bits, kMinRsaKeyBits,
+           kMaxKeyBits);
+  return -1;
 }
 
 int genKey(const char* keyPath, unsigned int bits) {
-  if (keyPath == nullptr || *keyPath == '\0' || !IsAcceptedKeySize(bits)) {
+  if (keyPath == nullptr || *keyPath == '\0' || checkKeySize(bits) != 0) {
     ORVA_LOG("genKey sanity failed");
     return -1;
   }

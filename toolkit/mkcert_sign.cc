@@ -17,12 +17,13 @@ namespace {
 
 bool IsEmpty(const char* text) { return text == nullptr || *text == '\0'; }
 
-// Writes the server extension file from the ";"-separated `aliases`.
-// 0 or -1 (logged).
-int WriteServerExtensions(const char* extFile, const char* aliases) {
+// Writes the server extension file for `request` from the ";"-separated
+// `aliases`. 0 or -1 (logged).
+int WriteServerExtensions(const char* extFile, const RequestFacts& request,
+                          const char* aliases) {
   OLIBSzListPtr names = SplitAliases(aliases);
   if (!names) return -1;
-  return generateServerCNF(extFile, names.get());
+  return generateServerCNF(extFile, request, names.get());
 }
 
 }  // namespace
@@ -78,10 +79,12 @@ int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,
     return -1;
   }
   if (aliases == nullptr) aliases = "";
+  RequestFacts request;
+  if (!ReadRequestFacts(requestPath, &request)) return -1;
 
   const char* output = nullptr;
   if (selfSigned == TRUE) {
-    if (generateCACNF(extFile) != 0) return -1;
+    if (generateCACNF(extFile, request.has_email) != 0) return -1;
     output = caOrOutput;
   } else {
     if (IsEmpty(serialPath) || IsEmpty(outputPath)) {
@@ -92,7 +95,7 @@ int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,
       ORVA_LOG("Serial file is not existed");
       return -1;
     }
-    if (WriteServerExtensions(extFile, aliases) != 0) return -1;
+    if (WriteServerExtensions(extFile, request, aliases) != 0) return -1;
     output = outputPath;
   }
   if (genDir(output) != 0) {

@@ -12,6 +12,7 @@
 #include "common/pem_password.h"
 #include "common/raii.h"
 #include "platform/olib/olib_file.h"
+#include "toolkit/key_strength.h"
 #include "upload/sslca_form_handler.h"
 
 namespace {
@@ -78,8 +79,22 @@ bool HoldsSoundKey(const char* keyPath) {
   return sound;
 }
 
-// 5502 when the key belongs to the certificate and is sound, else 5514 or
-// 5518 (a DSA key). Where the tool can compare (RSA) its answer stands: a
+// True when the private key of `keyPath` is one the device's own HTTPS can
+// use (IsStrongKey); logged when not.
+bool HoldsStrongKey(const char* keyPath) {
+  FilePtr file(std::fopen(keyPath, "r"));
+  EvpPkeyPtr key(file ? PEM_read_PrivateKey(file.get(), nullptr, RefusePemPassword, nullptr)
+                      : nullptr);
+  ERR_clear_error();
+  if (IsStrongKey(key.get())) return true;
+  ORVA_LOG("The key has %d bits: the device's HTTPS needs RSA keys of at least %d bits and EC "
+           "keys of at least %d", key ? EVP_PKEY_get_bits(key.get()) : 0, kMinRsaKeyBits,
+           kMinEcKeyBits);
+  return false;
+}
+
+// 5502 when the key belongs to the certificate and is sound and strong,
+// else 5514 or 5518 (a DSA key). Where the tool can compare (RSA) its answer stands: a
 // match, or a mismatch of two RSA moduli; otherwise, and when the tool
 // cannot tell, only a pair the library proves is accepted. Only failures
 // are logged.
@@ -97,6 +112,7 @@ int ProvePair(const char* cert, const char* key, __tag_CYPHER keyType) {
     ORVA_LOG("The private key %s fails its consistency check", key);
     result = kErrKeyMismatch;
   }
+  if (result == kErrNone && !HoldsStrongKey(key)) result = kErrKeyMismatch;
   return result;
 }
 

@@ -66,7 +66,9 @@ class SSLCAFormHandler : public ServerFormHandler {
   // intermediate certificate (null or "" for none) may be installed: each
   // file starts with its PEM header, the key is not a DSA key, the
   // intermediate file holds certificates that issued the certificate, and
-  // the key belongs to the certificate. Returns 5502 when the set is
+  // the key belongs to the certificate and is one the device's own HTTPS
+  // can use (an RSA key of at least 2048 bits, an EC key of at least 256:
+  // a smaller key is refused with 5514). Returns 5502 when the set is
   // acceptable, else the code of the first failed check: 5501, 5510, 5511,
   // 5512, 5514, 5516, 5517 or 5518. Where the openssl tool cannot compare
   // the pair, the library proves it instead (and refuses a DSA key it reads

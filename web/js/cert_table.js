@@ -4,6 +4,7 @@
 import {
   daysLeft, formatCertificateTime, parseCertificateTime, validityState, wholeDaysBetween,
 } from './cert_time.js';
+import { compatibilityWarnings } from './compatibility.js';
 
 const ROLE_NAMES = {
   server_cert: 'Server',
@@ -66,6 +67,20 @@ function daysLeftCell(state, days, ago) {
   return cell;
 }
 
+// The clients that refuse the certificate, and why; "None" when none does.
+function warningsCell(compatibility) {
+  const cell = element('td', '', 'warnings');
+  const warnings = compatibilityWarnings(compatibility);
+  if (warnings.length === 0) {
+    cell.append(element('span', 'None', 'muted'));
+    return cell;
+  }
+  const list = element('ul');
+  list.append(...warnings.map((warning) => element('li', warning)));
+  cell.append(list);
+  return cell;
+}
+
 function sameName(first, second) {
   return first !== null && JSON.stringify(first) === JSON.stringify(second);
 }
@@ -87,6 +102,7 @@ function row(entry, now, columnNames) {
   tr.append(timeCell(entry.valid_from));
   tr.append(timeCell(entry.valid_till));
   tr.append(daysLeftCell(state, days, daysAgo));
+  tr.append(warningsCell(entry.compatibility));
   // The column name of each cell, shown beside the value on narrow screens.
   [...tr.cells].forEach((cell, index) => { cell.dataset.label = columnNames[index]; });
   return tr;

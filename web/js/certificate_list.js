@@ -11,7 +11,7 @@ export async function loadInstalledCertificates(api) {
   const answers = await Promise.allSettled(ROLES.map((type) =>
     api.call('ORVA.Core.Certificate', 'list', {
       type,
-      additional: JSON.stringify(['valid_from', 'valid_till']),
+      additional: JSON.stringify(['valid_from', 'valid_till', 'compatibility']),
     })));
   const entries = [];
   for (const answer of answers) {

@@ -7,6 +7,7 @@ import { renderCertificates } from './cert_table.js';
 import { loadInstalledCertificates } from './certificate_list.js';
 import { describeError } from './messages.js';
 import { showMessage } from './show_message.js';
+import { bindServerDaysNote } from './server_days.js';
 import { buildSubjectFields } from './subject_fields.js';
 import { TokenGate } from './token_gate.js';
 import { WebApi } from './webapi.js';
@@ -77,6 +78,7 @@ function installed(data) {
 }
 
 buildSubjectFields(document, byId('subject-fields'));
+bindServerDaysNote(byId('csr-sign-days'), byId('csr-sign-days-note'));
 
 const runs = actionRuns(api, installed);
 for (const form of document.querySelectorAll('form[data-action]')) {

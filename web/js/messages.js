@@ -38,7 +38,8 @@ const CONTEXT_ERRORS = {
   },
   'crt-create': {
     5501: 'The device could not make the certificate authority and server certificate. ' +
-      'Check that both countries are two letters and the names use allowed characters.',
+      'Check that both countries are two letters, the names use allowed characters, and the ' +
+      'common name is a host name or IP address or other names of the device are given.',
     5503: 'The certificate authority’s details were not accepted. Its country must be two letters.',
   },
   'csr-create': {
@@ -51,11 +52,14 @@ const CONTEXT_ERRORS = {
   },
   import: {
     5501: 'The device could not read the uploaded files.',
+    5514: 'The private key does not belong to the certificate, or it is smaller than the ' +
+      'device’s HTTPS can use (RSA keys need 2048 bits, EC keys 256). Nothing was changed.',
     5503: 'Choose a certificate file and a private key file.',
   },
   'csr-sign': {
     5501: 'The request could not be signed. The device needs a local certificate authority ' +
-      '(create one first), and the file must be a valid signing request.',
+      '(create one first), the file must be a valid signing request, and the certificate must ' +
+      'name a host: give the machine’s names when the request names none.',
     5503: 'Choose a signing request and a validity of at least one day.',
   },
   'download-pending': {
