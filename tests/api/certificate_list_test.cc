@@ -41,11 +41,11 @@ TEST(CertificateList, ListsTheStoreFilesAsTheyAreNowAndAnswersForMissingOnes) {
   TempDeviceRoot root;
   EXPECT_EQ(5504, List().asInt()) << "no server certificate";
   ASSERT_TRUE(MakeSelfSignedCa(root.Path(kCaKeyPath), root.Path(kCaCrtPath),
-                               "/C=TW/O=Test CA/CN=Test Root", 1024));
+                               "/C=TW/O=Test CA/CN=Test Root"));
   ASSERT_TRUE(MakeSignedCertificate(
       root.Path(kCaKeyPath), root.Path(kCaCrtPath), root.Path(kServerKeyPath),
       root.Path(kServerCrtPath),
-      "/C=TW/ST=Taiwan/L=Taipei/O=Org/OU=IT/CN=nas.local/emailAddress=admin@nas.local", 1024));
+      "/C=TW/ST=Taiwan/L=Taipei/O=Org/OU=IT/CN=nas.local/emailAddress=admin@nas.local"));
   const Json::Value listed = List();
   ASSERT_EQ(2u, listed.size()) << listed;
   EXPECT_EQ(Parse(R"({"type":"server_cert","signature_algorithm":"sha256WithRSAEncryption",

@@ -39,7 +39,7 @@ TEST(CsrCreate, LeavesAPrivatePendingPairThatAFailureKeeps) {
   EXPECT_EQ(Json::Value(Json::objectValue), response.data());
   EXPECT_EQ(0700, FileMode(root.Path(kGenDir)));
   EXPECT_EQ(0400, FileMode(root.Path(kGenKeyPath)));
-  EXPECT_TRUE(Shows(root.Path(kGenCsrPath), "Public-Key: (1024 bit)"));
+  EXPECT_TRUE(Shows(root.Path(kGenCsrPath), "Public-Key: (2048 bit)"));
   const StoreState pending = ReadStore(root);
   ExpectStoreWhole(root, {});
   Json::Value params = SubjectParams();
@@ -48,11 +48,13 @@ TEST(CsrCreate, LeavesAPrivatePendingPairThatAFailureKeeps) {
   EXPECT_EQ(CertificateFiles(pending), CertificateFiles(ReadStore(root)));
 }
 
-// An RSA key's size is kept; another kind of key gives 2048 bits.
+// An RSA key's size is kept, raised to the 2048 bits that HTTPS needs;
+// another kind of key gives 2048 bits.
 TEST(CsrRenew, RepeatsTheInstalledSubjectAndKeySize) {
   const struct { const char *subject, *shown; int bits; KeyType type; const char* renewed; }
   cases[] = {
-      {"/C=DE/O=Org/CN=nas.local", "C=DE, O=Org, CN=nas.local", 1536, KeyType::kRsa, "(1536 bit)"},
+      {"/C=DE/O=Org/CN=nas.local", "C=DE, O=Org, CN=nas.local", 2304, KeyType::kRsa, "(2304 bit)"},
+      {"/C=TW/CN=small.local", "C=TW, CN=small.local", 1024, KeyType::kRsa, "(2048 bit)"},
       {"/C=TW/CN=ec.local", "C=TW, CN=ec.local", 0, KeyType::kEc, "(2048 bit)"},
   };
   for (const auto& c : cases) {
@@ -72,7 +74,7 @@ TEST(CsrRenew, RepeatsTheInstalledSubjectAndKeySize) {
 TEST(CsrSign, SignsAnUploadedRequestWithTheLocalCaAndRefusesWhatItCannotSign) {
   TempDeviceRoot root;
   const std::string csr = root.Path("/up/client.csr");
-  ASSERT_TRUE(MakeRequest(root.Path("/up/client.key"), csr, "/CN=client", 1024));
+  ASSERT_TRUE(MakeRequest(root.Path("/up/client.key"), csr, "/CN=client"));
   root.WriteFile("/up/certificate.pem", "-----BEGIN CERTIFICATE-----\n");
   Json::Value zero_days(Json::objectValue);
   zero_days["csr"] = "client.csr";
@@ -82,7 +84,7 @@ TEST(CsrSign, SignsAnUploadedRequestWithTheLocalCaAndRefusesWhatItCannotSign) {
   EXPECT_EQ(5519, CallSign(root.Path("/up/certificate.pem")).error_code());
   EXPECT_EQ(5501, CallSign(csr).error_code()) << "there is no local CA yet";
   EXPECT_FALSE(FileExists(root.Path(kGenCrtPath)));
-  ASSERT_TRUE(MakeSelfSignedCa(root.Path(kCaKeyPath), root.Path(kCaCrtPath), "/CN=Root", 1024));
+  ASSERT_TRUE(MakeSelfSignedCa(root.Path(kCaKeyPath), root.Path(kCaCrtPath), "/CN=Root"));
   const ORVA::APIResponse response = CallSign(csr);
   ASSERT_EQ(Outcome::kSuccess, response.outcome()) << response.error_code();
   EXPECT_EQ(Json::Value(Json::objectValue), response.data());
@@ -126,7 +128,7 @@ TEST(CrtCreate, RefusesBadSubjectsAndNamesOrInstallsAVerifiableSetAndActivatesIt
     EXPECT_FALSE(FileExists(root.Path("/ran")));
   }
   Json::Value params = BothSubjects();
-  params["ca_key_length"] = 1024;
+  params["ca_key_length"] = 3072;
   ASSERT_EQ(Outcome::kSuccess, CallMethod(doCertificateCreateCRT_v1, params).response.outcome());
   EXPECT_TRUE(RunForTest("openssl verify -CAfile '" + root.Path(kCaCrtPath) + "' '" +
                          root.Path(kServerCrtPath) + "'"));
@@ -135,7 +137,7 @@ TEST(CrtCreate, RefusesBadSubjectsAndNamesOrInstallsAVerifiableSetAndActivatesIt
                     "CN=Local Root/emailAddress=admin@new.local\n"))
       << PemText(root.Path(kServerCrtPath));
   EXPECT_TRUE(Shows(root.Path(kServerCrtPath), "Public-Key: (2048 bit)"));
-  EXPECT_TRUE(Shows(root.Path(kCaCrtPath), "Public-Key: (1024 bit)"));
+  EXPECT_TRUE(Shows(root.Path(kCaCrtPath), "Public-Key: (3072 bit)"));
   EXPECT_FALSE(FileExists(root.Path(kInterCrtPath))) << "the old chain no longer fits";
   EXPECT_EQ("ftpd-ssl\nwebdav-httpd-ssl\n", ReadFile(root.Path("/ran")));
   EXPECT_EQ(before.at(".gen/server.csr").content, ReadFile(root.Path(kGenCsrPath)));

@@ -39,7 +39,7 @@ TEST(OrvaWebapiCommands, InitMakesAPrivateTokenOnceCallAnswersAndServeRefusesBad
   }
   const std::string ssl = scratch.Path("/device/usr/orva/etc/ssl");
   ASSERT_TRUE(MakeSelfSignedCa(ssl + "/ssl.key/server.key", ssl + "/ssl.crt/server.crt",
-                               "/CN=nas.local", 1024));
+                               "/CN=nas.local"));
   const std::string listed =
       RunHost(scratch, "call " + root + " ORVA.Core.Certificate list type=server_cert");
   EXPECT_NE(std::string::npos, listed.find("\"common_name\":\"nas.local\"")) << listed;

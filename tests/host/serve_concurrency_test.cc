@@ -30,9 +30,9 @@ std::vector<std::pair<const char*, Call>> Calls(const TempDeviceRoot& root) {
     return Call([query](httplib::Client& client) { return client.Get(query.c_str()); });
   };
   httplib::Params crt = {{"api", "ORVA.Core.Certificate.CRT"}, {"method", "create"},
-                         {"key_length", "512"}, {"ca_key_length", "512"}};
+                         {"key_length", "2048"}, {"ca_key_length", "2048"}};
   httplib::Params csr = {{"api", "ORVA.Core.Certificate.CSR"}, {"method", "create"},
-                         {"key_length", "512"}};
+                         {"key_length", "2048"}};
   for (const char* prefix : {"", "ca_"}) {
     const Json::Value subject = SubjectParams(prefix);
     for (const std::string& name : subject.getMemberNames()) {

@@ -77,7 +77,7 @@ std::vector<std::string> Split(const std::string& text, char separator) {
 Json::Value Call(const ServeProcess& server, const std::string& fixtures, const Method& method,
                  const std::string& value, bool urlencoded, size_t mostTexts = 100) {
   httplib::Params fields = {{"api", method.api}, {"method", method.method}, {"days", "30"},
-                            {"key_length", "1024"}, {"ca_key_length", "1024"},
+                            {"key_length", "2048"}, {"ca_key_length", "2048"},
                             {"alias", "nas.local"}, {"country", "TW"}, {"ca_country", "TW"}};
   for (const std::string& field : Split(kSubjects, ' ')) fields.emplace(field, "hostile.local");
   const std::vector<std::string> texts = Split(method.texts, ' ');
@@ -116,10 +116,10 @@ TEST_F(ServeTest, NoHostileValueReachesAShellAndEveryArgumentArrivesWhole) {
                              "'\nexec /usr/bin/" + tool + " \"$@\"");
   }
   const std::string fixtures = scratch_.Path("/fixtures/");
-  ASSERT_TRUE(MakeSelfSignedCa(fixtures + "ca.key", fixtures + "inter_cert", "/CN=Root", 1024));
+  ASSERT_TRUE(MakeSelfSignedCa(fixtures + "ca.key", fixtures + "inter_cert", "/CN=Root"));
   ASSERT_TRUE(MakeSignedCertificate(fixtures + "ca.key", fixtures + "inter_cert",
-                                    fixtures + "key", fixtures + "cert", "/CN=srv.local", 1024));
-  ASSERT_TRUE(MakeRequest(fixtures + "request.key", fixtures + "csr", "/CN=client.local", 1024));
+                                    fixtures + "key", fixtures + "cert", "/CN=srv.local"));
+  ASSERT_TRUE(MakeRequest(fixtures + "request.key", fixtures + "csr", "/CN=client.local"));
   unlink(kMarker);  // left by an earlier faulty run, if any
   ServeProcess server(root);
   ASSERT_TRUE(server.started()) << server.Log();

@@ -28,7 +28,7 @@ bool MakeRequest(const std::string& keyPath, const std::string& csrPath,
 // An issuing chain of RSA keys of `bits` in `folder`: root.key, root.crt
 // ("/CN=Root"); inter.key, inter.crt ("/CN=Intermediate", by the root);
 // server.key, server.crt (`subject`, by the intermediate).
-bool MakeChain(const std::string& folder, const std::string& subject, int bits = 1024);
+bool MakeChain(const std::string& folder, const std::string& subject, int bits = 2048);
 
 // Runs a shell command line for test set-up, without input or output;
 // true when it exited with 0.

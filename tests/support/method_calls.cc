@@ -25,7 +25,7 @@ Json::Value SubjectParams(const std::string& prefix) {
 
 ORVA::APIResponse CallCreateCsr() {
   Json::Value params = SubjectParams();
-  params["key_length"] = "1024";
+  params["key_length"] = "2048";
   return CallMethod(doCertificateCreateCSR_v1, params).response;
 }
 
@@ -45,8 +45,8 @@ ORVA::APIResponse CallCreateCrt() {
   const Json::Value ca = SubjectParams("ca_");
   for (const std::string& name : ca.getMemberNames()) params[name] = ca[name];
   params["ca_common_name"] = "New Root";
-  params["key_length"] = "1024";
-  params["ca_key_length"] = "1024";
+  params["key_length"] = "2048";
+  params["ca_key_length"] = "2048";
   params["alias"] = "new.local;10.0.0.1";
   return CallMethod(doCertificateCreateCRT_v1, params).response;
 }

@@ -27,8 +27,8 @@ MethodAnswer CallMethod(MethodHandler handler,
 // `prefix` ("" or "ca_"), for the create methods.
 Json::Value SubjectParams(const std::string& prefix = "");
 
-// The methods with complete, valid parameters and 1024-bit keys, so the
-// tests stay quick.
+// The methods with complete, valid parameters and keys of the smallest
+// size the device makes (2048 bits).
 ORVA::APIResponse CallCreateCsr();
 ORVA::APIResponse CallRenew();
 // Signs the request file at the real path `csrPath` for 30 days.

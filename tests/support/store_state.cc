@@ -112,17 +112,17 @@ void RestoreStore(const TempDeviceRoot& root, const StoreState& state) {
 void InstallOldStore(const TempDeviceRoot& root) {
   const std::string ssl = root.Path(kStore);
   ASSERT_TRUE(MakeSelfSignedCa(ssl + "/ssl.key/ca.key", ssl + "/ssl.crt/ca.crt",
-                               "/CN=Old Root", 1024));
+                               "/CN=Old Root"));
   MakeDirs(ssl + "/ssl.csr");
   ASSERT_TRUE(RunForTest("openssl req -new -key '" + ssl + "/ssl.key/ca.key' -subj '/CN=Old Root' -out '" +
                          ssl + "/ssl.csr/ca.csr'"));
   ASSERT_TRUE(MakeSignedCertificate(ssl + "/ssl.key/ca.key", ssl + "/ssl.crt/ca.crt",
                                     ssl + "/ssl.key/server.key", ssl + "/ssl.crt/server.crt",
-                                    "/C=TW/O=Old Works/CN=old.local", 1024));
+                                    "/C=TW/O=Old Works/CN=old.local"));
   const std::string caCertificate = ReadFile(ssl + "/ssl.crt/ca.crt");
   root.WriteFile(std::string(kStore) + "/ssl.intercrt/server-ca.crt", caCertificate);
   ASSERT_TRUE(MakeRequest(ssl + "/.gen/server.key", ssl + "/.gen/server.csr",
-                          "/CN=pending.local", 1024));
+                          "/CN=pending.local"));
   root.WriteFile(std::string(kStore) + "/.gen/server.crt",
                  ReadFile(ssl + "/ssl.crt/server.crt"), 0400);
   root.WriteFile(std::string(kStore) + "/.mkcert.serial", "5F3A11");
@@ -131,10 +131,10 @@ void InstallOldStore(const TempDeviceRoot& root) {
     chmod((ssl + key).c_str(), 0400);
   }
   ASSERT_TRUE(MakeRequest(root.Path("/outside/request.key"), root.Path("/outside/request.csr"),
-                          "/CN=client.local", 1024));
+                          "/CN=client.local"));
   ASSERT_TRUE(MakeSignedCertificate(ssl + "/ssl.key/ca.key", ssl + "/ssl.crt/ca.crt",
                                     root.Path("/outside/server.key"),
-                                    root.Path("/outside/server.crt"), "/CN=imported.local", 1024));
+                                    root.Path("/outside/server.crt"), "/CN=imported.local"));
   root.WriteFile("/outside/server-ca.crt", caCertificate);
 }
 

@@ -30,7 +30,7 @@ void RestoreStore(const TempDeviceRoot& root, const StoreState& state);
 // certificate in the generation area, a configuration file and the serial.
 // Outside the store, in "/outside" of the device root: a request to sign
 // (request.csr, request.key) and a server set the CA signed, to import
-// (server.crt, server.key, server-ca.crt). 1024-bit keys keep it quick.
+// (server.crt, server.key, server-ca.crt).
 // Fails the test (fatal) when a fixture cannot be made.
 void InstallOldStore(const TempDeviceRoot& root);
 

@@ -22,7 +22,7 @@ TEST(ToolkitInjection, HostilePathsAndSubjectValuesArriveWhole) {
   CSR_ARGUMENT subject{"TW", "", "Z\xC3\xBCrich", "O'Reilly \\ $HOME #1 \"x\"", "ends with \\",
                        "'", ""};
 
-  ASSERT_EQ(0, genKey(key.c_str(), 1024));
+  ASSERT_EQ(0, genKey(key.c_str(), 2048));
   ASSERT_EQ(0, genCsr((folder + "/r.cfg").c_str(), key.c_str(), request.c_str(), &subject));
   ASSERT_EQ(0, genCrt((folder + "/x.cfg").c_str(), request.c_str(), certificate.c_str(), nullptr,
                       nullptr, key.c_str(), TRUE, 1, nullptr));
@@ -46,7 +46,7 @@ TEST(GenCsr, RefusedSubjectsWriteNothing) {
       {&CSR_ARGUMENT::organization, "a\x7f"},
   };
   TempDeviceRoot root;
-  ASSERT_TRUE(MakeRequest(root.Path(kGenKeyPath), root.Path("/scratch.csr"), "/CN=x", 1024));
+  ASSERT_TRUE(MakeRequest(root.Path(kGenKeyPath), root.Path("/scratch.csr"), "/CN=x"));
   for (const auto& c : cases) {
     SCOPED_TRACE(c.value);
     CSR_ARGUMENT subject{"TW", "Taipei", "Neihu", "Works", "Lab", "nas.local", "a@nas.local"};

@@ -31,15 +31,15 @@ TEST(GenKey, OnlyAWholeKeyFromAToolThatSucceededReplacesTheOldKey) {
     SCOPED_TRACE(std::string(c.output) + ", exit " + std::to_string(c.status));
     TempDeviceRoot root;
     const std::string key = root.Path(kServerKeyPath);
-    ASSERT_TRUE(MakeRequest(key, root.Path("/old.csr"), "/CN=old", 1024));
-    ASSERT_TRUE(MakeRequest(root.Path("/new.key"), root.Path("/new.csr"), "/CN=new", 1024));
+    ASSERT_TRUE(MakeRequest(key, root.Path("/old.csr"), "/CN=old"));
+    ASSERT_TRUE(MakeRequest(root.Path("/new.key"), root.Path("/new.csr"), "/CN=new"));
     root.WriteScript("/usr/orva/bin/openssl",
                      "for arg; do\n  if [ \"$previous\" = -out ]; then " + std::string(c.output) +
                          " > \"$arg\"; fi\n  previous=$arg\ndone\nexit " +
                          std::to_string(c.status));
     const std::string old_key = ReadFile(key);
     const StoreState before = ReadStore(root);
-    EXPECT_EQ(c.replaced ? 0 : -1, genKey(key.c_str(), 1024));
+    EXPECT_EQ(c.replaced ? 0 : -1, genKey(key.c_str(), 2048));
     EXPECT_EQ(c.replaced ? ReadFile(root.Path("/new.key")) : old_key, ReadFile(key));
     if (c.replaced) {
       EXPECT_EQ(0400, FileMode(key));

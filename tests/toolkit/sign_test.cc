@@ -26,9 +26,9 @@ CSR_ARGUMENT Subject() {
 TEST(GenServerCrt, LocalCaSignsVerifiableCertificatesNamingEachAliasAndRefusesOtherNames) {
   TempDeviceRoot root;
   CSR_ARGUMENT subject = Subject();
-  ASSERT_EQ(0, genCASet(&subject, 1024));
+  ASSERT_EQ(0, genCASet(&subject, 2048));
   const std::string request = root.Path("/upload/server.csr"), out = root.Path(kGenCrtPath);
-  ASSERT_TRUE(MakeRequest(root.Path("/upload/server.key"), request, "/CN=nas.local", 1024));
+  ASSERT_TRUE(MakeRequest(root.Path("/upload/server.key"), request, "/CN=nas.local"));
   auto sign = [&](const std::string& aliases, int days = 30) {
     return genServerCrt(request.c_str(), out.c_str(), days, aliases.c_str());
   };

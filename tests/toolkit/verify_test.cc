@@ -37,11 +37,10 @@ TEST(VerifyCrtAndKey, ResultsForPairsAndUnreadableFiles) {
 TEST(VerifyCrtChain, UpperCertificatesMustHaveSignedTheCertificate) {
   TempDeviceRoot root;
   ASSERT_TRUE(MakeChain(root.root(), "/CN=nas.local"));
-  ASSERT_TRUE(MakeSelfSignedCa(root.Path("/copy.key"), root.Path("/copy.crt"), "/CN=Intermediate",
-                               1024));
+  ASSERT_TRUE(MakeSelfSignedCa(root.Path("/copy.key"), root.Path("/copy.crt"), "/CN=Intermediate"));
   ASSERT_TRUE(MakeSignedCertificate(root.Path("/server.key"), root.Path("/server.crt"),
                                     root.Path("/below.key"), root.Path("/below.crt"),
-                                    "/CN=below", 1024));
+                                    "/CN=below"));
   const std::string inter = ReadFile(root.Path("/inter.crt")), top = ReadFile(root.Path("/root.crt"));
   root.WriteFile("/inter+root.crt", inter + top);
   root.WriteFile("/root+inter.crt", top + inter);

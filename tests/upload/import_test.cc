@@ -122,9 +122,9 @@ TEST_F(CertificateImport, InstallsWholeSetsWithoutByteOrderMarks) {
 TEST_F(CertificateImport, RefusedUploadsLeaveTheStoreUntouchedAndActivateNothing) {
   ASSERT_TRUE(MakeSelfSignedCa(Outside("dsa.key"), Outside("dsa.crt"), "/CN=dsa", 1024,
                                KeyType::kDsa));
-  ASSERT_TRUE(MakeSelfSignedCa(Outside("copy.key"), Outside("copy.crt"), "/CN=Old Root", 1024));
+  ASSERT_TRUE(MakeSelfSignedCa(Outside("copy.key"), Outside("copy.crt"), "/CN=Old Root"));
   ASSERT_TRUE(MakeSignedCertificate(Outside("server.key"), Outside("server.crt"),
-                                    Outside("below.key"), Outside("below.crt"), "/CN=below", 1024));
+                                    Outside("below.key"), Outside("below.crt"), "/CN=below"));
   ASSERT_TRUE(WriteKeyWithWrongPrivatePart(Outside("server.key"), Outside("wrong.key")));
   const std::string crt = ReadFile(Outside("server.crt")), key = ReadFile(Outside("server.key"));
   const std::string inter = ReadFile(Outside("server-ca.crt"));

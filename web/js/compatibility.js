@@ -4,7 +4,6 @@
 const REASONS = {
   expired: 'it has expired',
   not_yet_valid: 'its validity has not begun yet',
-  expires_soon: 'it expires within 30 days',
   empty_names: 'its list of names is empty',
   name_missing: 'the device’s name is not among the certificate’s names',
   no_server_auth: 'it is not marked for use by servers',
@@ -14,6 +13,11 @@ const REASONS = {
   ca_not_strict: 'as an authority it lacks critical basic constraints or the right to sign ' +
     'certificates',
   incomplete_chain: 'the device does not present the certificate that issued it',
+};
+
+// Problems that no client has yet: a sentence of their own.
+const NOTICES = {
+  expires_soon: 'It expires within 30 days; from then on every client will refuse it.',
 };
 
 function joinNames(names) {
@@ -27,6 +31,7 @@ function joinNames(names) {
 export function compatibilityWarnings(compatibility) {
   if (!Array.isArray(compatibility)) return [];
   return compatibility.map(({ code, clients }) => {
+    if (NOTICES[code]) return NOTICES[code];
     const reason = REASONS[code] ?? `a problem this page does not know (${code})`;
     return `${joinNames(Array.isArray(clients) ? clients : [])} will refuse it: ${reason}.`;
   });
