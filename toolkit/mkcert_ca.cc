@@ -13,6 +13,12 @@ constexpr int kCaValidityDays = 3650;
 
 int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, int bits,
                  std::string* key, std::string* certificate) {
+  for (const char* path : {kCaCsrPath, kCaCrtPath, kCaKeyPath}) {
+    if (genDir(OrvaPath(path).c_str()) != 0) {
+      ORVA_LOG("generate directory failed");
+      return -1;
+    }
+  }
   const std::string request = set->Add(OrvaPath(kCaCsrPath), StoreContent::kRequest);
   *certificate = set->Add(OrvaPath(kCaCrtPath), StoreContent::kCertificate);
   *key = set->Add(OrvaPath(kCaKeyPath), StoreContent::kPrivateKey);

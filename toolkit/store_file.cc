@@ -91,8 +91,7 @@ StoreFileSet::~StoreFileSet() {
 }
 
 std::string StoreFileSet::Add(const std::string& target, StoreContent content) {
-  std::string temporary;
-  if (MakeDirectories(DirectoryOf(target))) temporary = CreateTemporary(target);
+  const std::string temporary = CreateTemporary(target);
   if (temporary.empty()) {
     OLIB_SET_ERROR(errno);
     ORVA_LOG_LASTERR("Create temporary file for %s failed", target.c_str());

@@ -40,8 +40,8 @@ class StoreFileSet {
   StoreFileSet(const StoreFileSet&) = delete;
   StoreFileSet& operator=(const StoreFileSet&) = delete;
 
-  // Adds `target` (a real path) holding `content`, makes its folder when
-  // missing and creates its empty temporary file. Returns the temporary file's
+  // Adds `target` (a real path, in an existing folder) holding `content`
+  // and creates its empty temporary file. Returns the temporary file's
   // path, where the caller writes the new content; "" (logged) when it
   // cannot be created, and Install() then fails.
   std::string Add(const std::string& target, StoreContent content);

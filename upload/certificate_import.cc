@@ -89,6 +89,7 @@ int InstallUploads(const std::string& certPath, const std::string& keyPath,
   StoreFileSet set;
   for (const Upload& upload : uploads) {
     if (upload.source == nullptr) continue;
+    if (!MakeDirectories(DirectoryOf(OrvaPath(upload.target)))) return kErrStoreWrite;
     const std::string copy = set.Add(OrvaPath(upload.target), upload.content);
     if (copy.empty()) return kErrStoreWrite;
     ShellCommand command(kImportCommandSize);
