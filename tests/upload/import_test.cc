@@ -157,7 +157,7 @@ TEST_F(CertificateImport, RefusedUploadsLeaveTheStoreUntouchedAndActivateNothing
     if (c.inter) uploads["inter_cert_tmp"] = *c.inter;
     const time_t start = time(nullptr);
     EXPECT_EQ(c.code, Import(uploads).error_code());
-    EXPECT_LE(time(nullptr) - start, 10) << "nothing waits for a password";
+    EXPECT_LE(time(nullptr) - start, 60) << "nothing waits for a password";
     EXPECT_EQ(CertificateFiles(before_), CertificateFiles(ReadStore(root_)));
   }
   EXPECT_FALSE(FileExists(root_.Path("/activated")));
