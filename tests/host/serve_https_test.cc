@@ -1,10 +1,12 @@
-// The HTTPS listener of a real server: what a TLS handshake presents after
-// an import over HTTP, after restart-asking answers, and when the store
-// does not load.
+// HTTPS through nginx: what a TLS handshake presents after an import over
+// HTTP and after restart-asking answers, while clients keep calling over
+// HTTP and HTTPS, and when the store's pair does not load.
 
 #include <unistd.h>
 
+#include <atomic>
 #include <string>
+#include <thread>
 
 #include <gtest/gtest.h>
 
@@ -18,63 +20,70 @@ constexpr char kServerCrt[] = "/usr/orva/etc/ssl/ssl.crt/server.crt";
 
 }  // namespace
 
-TEST_F(ServeTest, HttpsPresentsTheStoreAsTheLastRestartAskingAnswerLeftIt) {
+TEST_F(ServeTest, HttpsTakesEachStorePairThatLoadsGracefullyAndKeepsTheLastOneOtherwise) {
   scratch_.WriteFile("/usr/orva/etc/orva.conf", "runHTTPS=\"yes\"\n");
-  auto install_self_signed = [&](const std::string& commonName) {
+  auto install_self_signed = [&](const std::string& commonName, int bits) {
     unlink(scratch_.Path("/usr/orva/etc/ssl/ssl.intercrt/server-ca.crt").c_str());
     return MakeSelfSignedCa(scratch_.Path(kServerKey), scratch_.Path(kServerCrt),
-                            "/CN=" + commonName);
+                            "/CN=" + commonName, bits);
   };
-  ASSERT_TRUE(install_self_signed("factory.local"));
+  ASSERT_TRUE(install_self_signed("factory.local", 2048));
   const std::string work = scratch_.Path("/outside/");
-  ASSERT_TRUE(MakeSelfSignedCa(work + "root.key", work + "root.crt", "/CN=Outside Root"));
-  ASSERT_TRUE(MakeSignedCertificate(work + "root.key", work + "root.crt", work + "inter.key",
-                                    work + "inter.crt", "/CN=Outside Intermediate"));
-  ASSERT_TRUE(MakeSignedCertificate(work + "inter.key", work + "inter.crt", work + "srv.key",
-                                    work + "srv.crt", "/CN=imported.example"));
+  ASSERT_TRUE(MakeChain(work, "/CN=imported.example", 2048));
   ServeProcess server(scratch_.root());
   ASSERT_TRUE(server.started()) << server.Log();
   const int port = server.https_port();
   ASSERT_GT(port, 0) << server.Output() << server.Log();
-  EXPECT_EQ("CN = factory.local\n", PresentedSubjects(port));
+  EXPECT_EQ("CN = factory.local\n", PresentedSubjects(port, "-tls1_2"));
+  EXPECT_EQ("", PresentedSubjects(port, "-tls1_2 -cipher AES128-GCM-SHA256"))
+      << "TLS 1.2 only with forward secrecy";
+  EXPECT_EQ("", PresentedSubjects(port, "-tls1_1"));
   auto presents = [port](const std::string& subjects) {
     return WaitFor([&] { return PresentedSubjects(port) == subjects; });
   };
-  auto restart = [&] {
-    return server.AuthorizedClient().Get("/webapi?api=ORVA.Test&method=restart");
+  auto client = [&](bool https) {
+    httplib::Client client(https ? "https://127.0.0.1:" + std::to_string(port)
+                                 : "http://127.0.0.1:" + std::to_string(server.http_port()));
+    client.enable_server_certificate_verification(false);
+    client.set_bearer_token_auth(server.Token());
+    return client;
+  };
+  // Watchers call over HTTP and HTTPS, each call on a new connection.
+  std::atomic<bool> watching{true};
+  std::atomic<int> answered{0}, failed{0};
+  auto watch = [&](bool https) {
+    while (watching) {
+      auto result = client(https).Get(kListQuery);
+      ++(result && result->status == 200 ? answered : failed);
+    }
+  };
+  std::thread watchers[] = {std::thread(watch, false), std::thread(watch, true)};
+  auto restart = [&](bool https) {
+    auto answer = client(https).Get("/webapi?api=ORVA.Test&method=restart");
+    return answer ? answer->get_header_value("X-Web-Certificate") : "no answer";
   };
 
   auto imported = server.AuthorizedClient().Post(
-      "/webapi", ImportForm(ReadFile(work + "srv.crt"), ReadFile(work + "srv.key"),
+      "/webapi", ImportForm(ReadFile(work + "server.crt"), ReadFile(work + "server.key"),
                             ReadFile(work + "inter.crt")));
   ASSERT_TRUE(imported);
-  ASSERT_TRUE(ParseJson(imported->body)["success"].asBool()) << imported->body;
-  EXPECT_TRUE(presents("CN = imported.example\nCN = Outside Intermediate\n"))
-      << PresentedSubjects(port);
+  EXPECT_EQ("new", imported->get_header_value("X-Web-Certificate")) << imported->body;
+  EXPECT_TRUE(presents("CN = imported.example\nCN = Intermediate\n")) << PresentedSubjects(port);
 
-  ASSERT_TRUE(install_self_signed("second.test"));
-  EXPECT_EQ("CN = imported.example\nCN = Outside Intermediate\n", PresentedSubjects(port))
+  ASSERT_TRUE(install_self_signed("second.test", 2048));
+  EXPECT_EQ("CN = imported.example\nCN = Intermediate\n", PresentedSubjects(port))
       << "nothing changes before a restart-asking answer";
-  httplib::SSLClient over_https("127.0.0.1", port);
-  over_https.enable_server_certificate_verification(false);
-  over_https.set_bearer_token_auth(server.Token());
-  auto answer = over_https.Get("/webapi?api=ORVA.Test&method=restart");
-  ASSERT_TRUE(answer) << "the answer goes out before the listener reloads";
-  EXPECT_EQ(200, answer->status);
+  EXPECT_EQ("new", restart(true));
   EXPECT_TRUE(presents("CN = second.test\n")) << PresentedSubjects(port);
 
-  ASSERT_TRUE(MakeSelfSignedCa(work + "other.key", work + "other.crt", "/CN=other"));
-  scratch_.WriteFile(kServerKey, ReadFile(work + "other.key"));
-  ASSERT_TRUE(restart());
-  EXPECT_TRUE(presents("")) << "down";
+  ASSERT_TRUE(install_self_signed("too-small.test", 1024));
+  EXPECT_EQ("previous", restart(false)) << "nginx refuses keys under 2048 bits";
+  EXPECT_EQ("CN = second.test\n", PresentedSubjects(port));
   EXPECT_NE(std::string::npos,
-            server.Log().find("HTTPS listener is down: /usr/orva/etc/ssl/ssl.key/server.key "
-                              "does not belong to /usr/orva/etc/ssl/ssl.crt/server.crt"));
-  auto listed = server.AuthorizedClient().Get(kListQuery);
-  ASSERT_TRUE(listed);
-  EXPECT_EQ(200, listed->status) << "HTTP stays up";
-
-  ASSERT_TRUE(install_self_signed("mended.test"));
-  ASSERT_TRUE(restart());
-  EXPECT_TRUE(presents("CN = mended.test\n")) << "up again on the same port";
+            server.Log().find("HTTPS keeps the previous certificate: nginx does not load the "
+                              "store's server certificate and key"));
+  watching = false;
+  for (std::thread& watcher : watchers) watcher.join();
+  EXPECT_EQ(0, failed) << "of " << answered << " calls while nginx reloaded";
+  EXPECT_GT(answered, 10);
 }
