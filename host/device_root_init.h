@@ -5,9 +5,10 @@
 
 // Provisions a device root at `root` (made when missing): the tool links in
 // usr/orva/bin, an empty certificate store, the system configuration, the
-// service and plug-in folders, the ACME challenge folder, the host's access token (mode 0600) and the
-// MAC address file. Never overwrites what exists. Returns true on success;
-// false with a message in *error, leaving what was made so far.
+// service and plug-in folders, the ACME challenge folder, the host's access
+// token (mode 0600) and the MAC address file. Never overwrites what exists.
+// Returns true on success; false with a message in *error, leaving what was
+// made so far.
 bool InitDeviceRoot(const std::string& root, std::string* error);
 
 // Makes `root` absolute in *absolute and exports it as ORVA_ROOT, the

@@ -89,8 +89,9 @@ std::string FrontConfig(const FrontSettings& settings) {
       "    root " + QuotedPath(settings.web) + ";\n"
       "    disable_symlinks on from=$document_root;\n"
       "    add_header Cache-Control $cache_control always;\n"
-      "    add_header Content-Security-Policy \"default-src 'self'; frame-ancestors 'none'; "
-      "base-uri 'none'; form-action 'self'\" always;\n"
+      // The page's icon is an empty data: URL.
+      "    add_header Content-Security-Policy \"default-src 'self'; img-src 'self' data:; "
+      "frame-ancestors 'none'; base-uri 'none'; form-action 'self'\" always;\n"
       "    add_header X-Frame-Options DENY always;\n"
       "    add_header X-Content-Type-Options nosniff always;\n"
       "    location ^~ /.well-known/acme-challenge/ {\n"

@@ -128,7 +128,8 @@ int RunServe(const ServeOptions& options) {
   std::printf("orva-webapi: serving the device root %s\n", root.c_str());
   std::printf("nginx: %s (configuration, pid file, error log)\n", FrontServer::Folder().c_str());
   std::printf("web:   %s\n", settings.web.c_str());
-  std::printf("http:  %s\n", ListenUrl("http", settings.http.host, settings.http.port, "/").c_str());
+  const ListenAddress& http = settings.http;
+  std::printf("http:  %s\n", ListenUrl("http", http.host, http.port, "/").c_str());
   std::printf("https: %s\n", HttpsLine(*front).c_str());
   std::printf("token: %s (send it as \"Authorization: Bearer TOKEN\" to /webapi)\n",
               TokenPath(root).c_str());

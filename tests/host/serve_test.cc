@@ -106,7 +106,7 @@ TEST_F(ServeTest, EveryRequestGetsItsAnswerAtTheDoor) {
   for (int i = 1; i < 2700; ++i) ranges += ",-1";
   const std::string page_headers[] = {
       "Cache-Control: no-cache", "X-Frame-Options: DENY", "X-Content-Type-Options: nosniff",
-      "Content-Security-Policy: default-src 'self'; frame-ancestors 'none'"};
+      "Content-Security-Policy: default-src 'self'; img-src 'self' data:; frame-ancestors 'none'"};
   const size_t limit = 4 * 1024 * 1024;
   const struct {
     const char* what;
@@ -128,11 +128,13 @@ TEST_F(ServeTest, EveryRequestGetsItsAnswerAtTheDoor) {
       {"scheme in small letters", get(list, "bearer " + token), 200},
       {"scheme in capitals", get(list, "BEARER " + token), 200},
       {"answer that is not UTF-8", call("api=ORVA.Test&method=echo&text=Z%C3%BCrich%E9%C0%AF%E2%82"),
-       200, {"\"text\":\"Z\xC3\xBCrich\xEF\xBF\xBD\xEF\xBF\xBD\xEF\xBF\xBD\xEF\xBF\xBD\xEF\xBF\xBD\""}},
+       200, {"\"text\":\"Z\xC3\xBCrich\xEF\xBF\xBD\xEF\xBF\xBD"
+             "\xEF\xBF\xBD\xEF\xBF\xBD\xEF\xBF\xBD\""}},
       {"web API answers", call("api=ORVA.Test&method=echo"), 200,
        {"Cache-Control: no-store", "X-Content-Type-Options: nosniff"}},
-      {"2,700 ranges of an answer", raw("GET /webapi?api=ORVA.Test&method=echo", ranges + "\r\n\r\n",
-                                         bearer), 200, {"\r\n\r\n{\"data\""}},
+      {"2,700 ranges of an answer",
+       raw("GET /webapi?api=ORVA.Test&method=echo", ranges + "\r\n\r\n", bearer), 200,
+       {"\r\n\r\n{\"data\""}},
       {"HEAD runs no handler", raw("HEAD /webapi?" + echo, "\r\n", bearer), 405},
       {"PUT", raw("PUT /webapi?" + echo, "Content-Length: 0\r\n\r\n", bearer), 405},
       {"unknown method", call("api=ORVA.Core.Certificate&method=delete"), 404},
@@ -159,8 +161,9 @@ TEST_F(ServeTest, EveryRequestGetsItsAnswerAtTheDoor) {
                                     bearer), 400, {kNginxPage}},
       {"other Transfer-Encoding", raw("POST /webapi", "Transfer-Encoding: gzip\r\n\r\n", bearer),
        501, {kNginxPage}},
-      {"two lengths", raw("POST /webapi", "Content-Length: 1\r\nContent-Length: 1\r\n\r\na", bearer),
-       400, {kNginxPage}},
+      {"two lengths",
+       raw("POST /webapi", "Content-Length: 1\r\nContent-Length: 1\r\n\r\na", bearer), 400,
+       {kNginxPage}},
       {"signed length", raw("POST /webapi", "Content-Length: +1\r\n\r\na", bearer), 400,
        {kNginxPage}},
       {"listed length", raw("POST /webapi", "Content-Length: 1, 1\r\n\r\na", bearer), 400,
@@ -222,7 +225,9 @@ TEST_F(ServeTest, SixteenHostileClientsHoldLittleMemoryWhileATokenHolderIsServed
   };
   std::vector<std::unique_ptr<RawConnection>> clients;
   for (const auto& kind : kinds) {
-    for (int i = 0; i < 4; ++i) clients.push_back(std::make_unique<RawConnection>(kind.port, kind.sent));
+    for (int i = 0; i < 4; ++i) {
+      clients.push_back(std::make_unique<RawConnection>(kind.port, kind.sent));
+    }
   }
   const long memory_kib = server.MemoryKib();
   EXPECT_LT(memory_kib, 24 * 1024) << "nginx and the host, in KiB";
