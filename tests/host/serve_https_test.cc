@@ -1,12 +1,16 @@
-// HTTPS through nginx: what a TLS handshake presents after an import over
-// HTTP and after restart-asking answers, while clients keep calling over
-// HTTP and HTTPS, and when the store's pair does not load.
+// HTTPS through nginx while the door is under attack: what a TLS handshake
+// presents after an import and after restart-asking answers, while token
+// holders keep calling over HTTP and HTTPS and sixteen hostile clients
+// hold connections open.
 
 #include <unistd.h>
 
 #include <atomic>
+#include <chrono>
+#include <memory>
 #include <string>
 #include <thread>
+#include <vector>
 
 #include <gtest/gtest.h>
 
@@ -20,7 +24,8 @@ constexpr char kServerCrt[] = "/usr/orva/etc/ssl/ssl.crt/server.crt";
 
 }  // namespace
 
-TEST_F(ServeTest, HttpsTakesEachStorePairThatLoadsGracefullyAndKeepsTheLastOneOtherwise) {
+TEST_F(ServeTest, HttpsTakesEachStorePairThatLoadsWhileHostileClientsHoldTheDoor) {
+  using Clock = std::chrono::steady_clock;
   scratch_.WriteFile("/usr/orva/etc/orva.conf", "runHTTPS=\"yes\"\n");
   auto install_self_signed = [&](const std::string& commonName, int bits) {
     unlink(scratch_.Path("/usr/orva/etc/ssl/ssl.intercrt/server-ca.crt").c_str());
@@ -31,7 +36,6 @@ TEST_F(ServeTest, HttpsTakesEachStorePairThatLoadsGracefullyAndKeepsTheLastOneOt
   const std::string work = scratch_.Path("/outside/");
   ASSERT_TRUE(MakeChain(work, "/CN=imported.example", 2048));
   ServeProcess server(scratch_.root());
-  ASSERT_TRUE(server.started()) << server.Log();
   const int port = server.https_port();
   ASSERT_GT(port, 0) << server.Output() << server.Log();
   EXPECT_EQ("CN = factory.local\n", PresentedSubjects(port, "-tls1_2"));
@@ -48,42 +52,79 @@ TEST_F(ServeTest, HttpsTakesEachStorePairThatLoadsGracefullyAndKeepsTheLastOneOt
     client.set_bearer_token_auth(server.Token());
     return client;
   };
-  // Watchers call over HTTP and HTTPS, each call on a new connection.
+  // Token holders list over HTTP and HTTPS, each call on a new connection.
   std::atomic<bool> watching{true};
   std::atomic<int> answered{0}, failed{0};
+  std::atomic<long> slowest_ms{0};
   auto watch = [&](bool https) {
     while (watching) {
+      const auto asked = Clock::now();
       auto result = client(https).Get(kListQuery);
       ++(result && result->status == 200 ? answered : failed);
+      const long ms = std::chrono::duration_cast<std::chrono::milliseconds>(
+          Clock::now() - asked).count();
+      if (ms > slowest_ms) slowest_ms = ms;
     }
   };
   std::thread watchers[] = {std::thread(watch, false), std::thread(watch, true)};
+
+  // Four of each; the answer's status, 0 when nginx closes without one.
+  std::string flood = "POST /webapi HTTP/1.1\r\nHost: d\r\n";
+  for (int i = 0; i < 1000; ++i) flood += "X-Flood: " + std::string(8192, 'f') + "\r\n";
+  const struct {
+    const char* what;
+    int port;
+    std::string sent;
+    int status;
+  } kinds[] = {
+      {"one header line, then nothing", server.http_port(), "GET / HTTP/1.1\r\nHost: d\r\n", 0},
+      {"8 MB of 8 KB header lines", server.http_port(), flood, 400},
+      {"no TLS handshake", port, "", 0},
+      {"a 1 MiB body without a length", server.http_port(),
+       "POST / HTTP/1.1\r\nHost: d\r\n\r\n" + std::string(1 << 20, 'b'), 405},
+  };
+  const auto attacked = Clock::now();
+  std::vector<std::unique_ptr<RawConnection>> hostile;
+  for (const auto& kind : kinds) {
+    for (int i = 0; i < 4; ++i) {
+      hostile.push_back(std::make_unique<RawConnection>(kind.port, kind.sent));
+    }
+  }
+  const long memory_kib = server.MemoryKib();
+  EXPECT_LT(memory_kib, 24 * 1024) << "nginx and the host, in KiB";
+
   auto restart = [&](bool https) {
     auto answer = client(https).Get("/webapi?api=ORVA.Test&method=restart");
     return answer ? answer->get_header_value("X-Web-Certificate") : "no answer";
   };
-
-  auto imported = server.AuthorizedClient().Post(
+  auto imported = client(false).Post(
       "/webapi", ImportForm(ReadFile(work + "server.crt"), ReadFile(work + "server.key"),
                             ReadFile(work + "inter.crt")));
   ASSERT_TRUE(imported);
   EXPECT_EQ("new", imported->get_header_value("X-Web-Certificate")) << imported->body;
   EXPECT_TRUE(presents("CN = imported.example\nCN = Intermediate\n")) << PresentedSubjects(port);
-
   ASSERT_TRUE(install_self_signed("second.test", 2048));
   EXPECT_EQ("CN = imported.example\nCN = Intermediate\n", PresentedSubjects(port))
       << "nothing changes before a restart-asking answer";
   EXPECT_EQ("new", restart(true));
   EXPECT_TRUE(presents("CN = second.test\n")) << PresentedSubjects(port);
-
   ASSERT_TRUE(install_self_signed("too-small.test", 1024));
   EXPECT_EQ("previous", restart(false)) << "nginx refuses keys under 2048 bits";
   EXPECT_EQ("CN = second.test\n", PresentedSubjects(port));
   EXPECT_NE(std::string::npos,
             server.Log().find("HTTPS keeps the previous certificate: nginx does not load the "
                               "store's server certificate and key"));
+
+  for (size_t i = 0; i < hostile.size(); ++i) {
+    SCOPED_TRACE(kinds[i / 4].what);
+    EXPECT_EQ(kinds[i / 4].status, RawStatus(hostile[i]->Reply(15000)));
+  }
+  EXPECT_LT(Clock::now() - attacked, std::chrono::seconds(14)) << "silent ones cut after 10 s";
   watching = false;
   for (std::thread& watcher : watchers) watcher.join();
   EXPECT_EQ(0, failed) << "of " << answered << " calls while nginx reloaded";
   EXPECT_GT(answered, 10);
+  EXPECT_LT(slowest_ms, 1000);
+  std::printf("16 hostile clients: %ld KiB (nginx and the host); %d calls, slowest %ld ms\n",
+              memory_kib, answered.load(), slowest_ms.load());
 }

@@ -1,12 +1,10 @@
 // End-to-end tests of "orva-webapi serve" and its nginx over loopback at the
 // door: start and stop, the token, the refusals of both, the page folder,
-// the headers, uploads, and clients that attack the door itself.
+// the headers and uploads.
 
 #include <signal.h>
 #include <unistd.h>
 
-#include <chrono>
-#include <memory>
 #include <string>
 #include <vector>
 
@@ -14,7 +12,6 @@
 
 #include "host/device_root_init.h"
 #include "tests/host/serve_process.h"
-#include "tests/support/certificates.h"
 
 namespace {
 
@@ -62,9 +59,7 @@ TEST_F(ServeTest, StartupNamesTheUrlsAndTheTokenFileAndASignalOrNginxsEndStopsBo
 TEST_F(ServeTest, EveryRequestGetsItsAnswerAtTheDoor) {
   scratch_.WriteFile("/secret.txt", "SECRET");
   scratch_.WriteFile("/web/index.html", "<html>index</html>");
-  scratch_.WriteFile("/web/app.js", "let page = 1;");
   scratch_.WriteFile("/usr/orva/etc/ssl/acme-challenge/t0k3n", "t0k3n.thumbprint");
-  MakeDirs(scratch_.Path("/web/sub"));
   ASSERT_EQ(0, symlink(scratch_.Path("/secret.txt").c_str(), scratch_.Path("/web/leak").c_str()));
   ASSERT_EQ(0, symlink(scratch_.root().c_str(), scratch_.Path("/web/root").c_str()));
   ServeProcess server(scratch_.root(), scratch_.Path("/web"));
@@ -115,18 +110,13 @@ TEST_F(ServeTest, EveryRequestGetsItsAnswerAtTheDoor) {
     std::vector<std::string> shows = {};  // texts of the answer
   } cases[] = {
       {"no token", get(list, ""), 401},
-      {"empty token", get(list, "Bearer "), 401},
       {"token and more", get(list, bearer + "0"), 401},
       {"token cut short", get(list, bearer.substr(0, bearer.size() - 1)), 401},
       {"token after other text", get(list, "Bearer " + std::string(6000, 'a') + token), 401},
-      {"two blanks", get(list, "Bearer  " + token), 401},
-      {"no blank", get(list, "Bearer-" + token), 401},
       {"other scheme", get(list, "Basic " + token), 401},
-      {"token alone", get(list, token), 401},
       {"a refused body is no request", raw("POST /webapi", "Content-Length: " +
            std::to_string(run_echo.size()) + "\r\n\r\n" + run_echo, ""), 401},
-      {"scheme in small letters", get(list, "bearer " + token), 200},
-      {"scheme in capitals", get(list, "BEARER " + token), 200},
+      {"scheme in any case", get(list, "bEARER " + token), 200},
       {"answer that is not UTF-8", call("api=ORVA.Test&method=echo&text=Z%C3%BCrich%E9%C0%AF%E2%82"),
        200, {"\"text\":\"Z\xC3\xBCrich\xEF\xBF\xBD\xEF\xBF\xBD"
              "\xEF\xBF\xBD\xEF\xBF\xBD\xEF\xBF\xBD\""}},
@@ -136,14 +126,12 @@ TEST_F(ServeTest, EveryRequestGetsItsAnswerAtTheDoor) {
        raw("GET /webapi?api=ORVA.Test&method=echo", ranges + "\r\n\r\n", bearer), 200,
        {"\r\n\r\n{\"data\""}},
       {"HEAD runs no handler", raw("HEAD /webapi?" + echo, "\r\n", bearer), 405},
-      {"PUT", raw("PUT /webapi?" + echo, "Content-Length: 0\r\n\r\n", bearer), 405},
       {"unknown method", call("api=ORVA.Core.Certificate&method=delete"), 404},
       {"unknown version", call(list + "&version=2"), 404},
       {"last row of the test module", call("api=ORVA.Test&method=restart"), 200},
       {"row past the test module's count", call("api=ORVA.Test&method=beyond"), 404},
       {"no method", call("api=ORVA.Core.Certificate"), 400},
       {"version not a number", call(list + "&version=1x"), 400},
-      {"version too long", call(list + "&version=1234567890"), 400},
       {"parameter given twice", call(list + "&type=a&type=b"), 400},
       {"query and form both",
        post("/webapi?" + list, "application/x-www-form-urlencoded", "api=ORVA.Test"), 400},
@@ -172,14 +160,10 @@ TEST_F(ServeTest, EveryRequestGetsItsAnswerAtTheDoor) {
                                 page_headers[2], page_headers[3]}},
       {"2,700 ranges of the page", raw("GET /", ranges + "\r\n\r\n", ""), 200,
        {"\r\n\r\n<html>index</html>"}},
-      {"script", page("/app.js"), 200, {"Content-Type: text/javascript"}},
       {"ACME challenge", page("/.well-known/acme-challenge/t0k3n"), 200,
        {"\r\n\r\nt0k3n.thumbprint"}},
-      {"folder without index", page("/sub/"), 403},
       {"link out of the folder", page("/leak"), 403},
       {"folder linked from outside", page("/root/secret.txt"), 404},
-      {"encoded ..", page("/sub/%2E%2E/%2E%2E/secret.txt"), 400},
-      {"encoded NUL", page("/index.html%00.js"), 400},
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(c.what);
@@ -199,48 +183,4 @@ TEST_F(ServeTest, EveryRequestGetsItsAnswerAtTheDoor) {
   }
   EXPECT_EQ(0, CountFiles(server.UploadFolder())) << "no upload kept";
   EXPECT_FALSE(FileExists(mark)) << "no refused request, body or HEAD ran a handler";
-}
-
-TEST_F(ServeTest, SixteenHostileClientsHoldLittleMemoryWhileATokenHolderIsServed) {
-  scratch_.WriteFile("/usr/orva/etc/orva.conf", "runHTTPS=\"yes\"\n");
-  ASSERT_TRUE(MakeSelfSignedCa(scratch_.Path("/usr/orva/etc/ssl/ssl.key/server.key"),
-                               scratch_.Path("/usr/orva/etc/ssl/ssl.crt/server.crt"), "/CN=d"));
-  ServeProcess server(scratch_.root());
-  ASSERT_GT(server.https_port(), 0) << server.Output() << server.Log();
-  std::string flood = "POST /webapi HTTP/1.1\r\nHost: d\r\n";
-  for (int i = 0; i < 1000; ++i) flood += "X-Flood: " + std::string(8192, 'f') + "\r\n";
-  const auto start = std::chrono::steady_clock::now();
-  // Four of each; the answer's status, 0 when nginx closes without one.
-  const struct {
-    const char* what;
-    int port;
-    std::string sent;
-    int status;
-  } kinds[] = {
-      {"one header line, then nothing", server.http_port(), "GET / HTTP/1.1\r\nHost: d\r\n", 0},
-      {"8 MB of 8 KB header lines", server.http_port(), flood, 400},
-      {"no TLS handshake", server.https_port(), "", 0},
-      {"a 1 MiB body without a length", server.http_port(),
-       "POST / HTTP/1.1\r\nHost: d\r\n\r\n" + std::string(1 << 20, 'b'), 405},
-  };
-  std::vector<std::unique_ptr<RawConnection>> clients;
-  for (const auto& kind : kinds) {
-    for (int i = 0; i < 4; ++i) {
-      clients.push_back(std::make_unique<RawConnection>(kind.port, kind.sent));
-    }
-  }
-  const long memory_kib = server.MemoryKib();
-  EXPECT_LT(memory_kib, 24 * 1024) << "nginx and the host, in KiB";
-  const auto asked = std::chrono::steady_clock::now();
-  auto listed = server.AuthorizedClient().Get(kListQuery);
-  EXPECT_LT(std::chrono::steady_clock::now() - asked, std::chrono::seconds(1));
-  ASSERT_TRUE(listed);
-  EXPECT_EQ(200, listed->status);
-  for (size_t i = 0; i < clients.size(); ++i) {
-    SCOPED_TRACE(kinds[i / 4].what);
-    EXPECT_EQ(kinds[i / 4].status, RawStatus(clients[i]->Reply(15000)));
-  }
-  EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(14))
-      << "silent clients are cut after 10 s";
-  std::printf("memory of nginx and the host with 16 hostile clients: %ld KiB\n", memory_kib);
 }
