@@ -1,8 +1,5 @@
 #include "host/http_server.h"
 
-#include <fcntl.h>
-#include <sys/socket.h>
-
 #include <utility>
 
 #include "common/log.h"
@@ -33,13 +30,6 @@ const char* CertificateText(FrontServer::Certificate certificate) {
   return "none";
 }
 
-// Programs the host starts (nginx, the tools) must not hold its port.
-void PrivateListenerSocket(socket_t fd) {
-  const int yes = 1;
-  setsockopt(fd, SOL_SOCKET, SO_REUSEADDR, &yes, sizeof(yes));
-  fcntl(fd, F_SETFD, FD_CLOEXEC);
-}
-
 }  // namespace
 
 WebapiService::WebapiService(std::vector<ORVA::APITable> tables,
@@ -62,7 +52,6 @@ void WebapiService::Install(httplib::Server* server) {
   // Headers and body go out in separate writes; without this, a client on
   // a kept-alive connection waits for a delayed acknowledgement per answer.
   server->set_tcp_nodelay(true);
-  server->set_socket_options(PrivateListenerSocket);
 
   server->set_pre_routing_handler(
       [this](const Request& request, Response& response) {

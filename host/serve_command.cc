@@ -1,6 +1,8 @@
 #include "host/serve_command.h"
 
+#include <fcntl.h>
 #include <signal.h>
+#include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <syslog.h>
@@ -119,8 +121,19 @@ int RunServe(const ServeOptions& options) {
                         &store_order);
   httplib::Server backend;
   service.Install(&backend);
+  socket_t backend_socket = -1;
+  backend.set_socket_options([&backend_socket](socket_t fd) {
+    const int yes = 1;
+    setsockopt(fd, SOL_SOCKET, SO_REUSEADDR, &yes, sizeof(yes));
+    fcntl(fd, F_SETFD, FD_CLOEXEC);  // nginx and the tools must not hold the port
+    backend_socket = fd;
+  });
   settings.backend_port = backend.bind_to_any_port("127.0.0.1");
-  if (settings.backend_port <= 0) return Fail("cannot listen on 127.0.0.1");
+  // nginx opens a connection per call. The library listens with a backlog of
+  // 5: a burst of more waits a second for the client to send its SYN again.
+  if (settings.backend_port <= 0 || listen(backend_socket, SOMAXCONN) != 0) {
+    return Fail("cannot listen on 127.0.0.1");
+  }
   front = std::make_unique<FrontServer>(settings, &store_order);
   ListenerThread backend_listener(&backend);
   if (!front->Start(&error)) return Fail(error);
