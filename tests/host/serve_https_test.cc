@@ -4,6 +4,7 @@
 // hold connections open.
 
 #include <unistd.h>
+#include <valgrind/valgrind.h>
 
 #include <atomic>
 #include <chrono>
@@ -62,9 +63,10 @@ TEST_F(ServeTest, HttpsTakesEachStorePairThatLoadsWhileHostileClientsHoldTheDoor
   std::atomic<int> answered{0}, failed{0};
   std::atomic<long> slowest_ms{0};
   auto watch = [&](bool https) {
+    httplib::Client watcher = client(https);
     while (watching) {
       const auto asked = Clock::now();
-      auto result = client(https).Get(kListQuery);
+      auto result = watcher.Get(kListQuery);
       ++(result && result->status == 200 ? answered : failed);
       const long ms = std::chrono::duration_cast<std::chrono::milliseconds>(
           Clock::now() - asked).count();
@@ -129,7 +131,9 @@ TEST_F(ServeTest, HttpsTakesEachStorePairThatLoadsWhileHostileClientsHoldTheDoor
   for (std::thread& watcher : watchers) watcher.join();
   EXPECT_EQ(0, failed) << "of " << answered << " calls while nginx reloaded";
   EXPECT_GT(answered, 10);
-  EXPECT_LT(slowest_ms, 1000);
+  // Under valgrind this process runs one thread at a time, slowly: the token
+  // holders wait for the hostile clients' writes.
+  EXPECT_LT(slowest_ms, RUNNING_ON_VALGRIND ? 10000 : 1000);
   std::printf("16 hostile clients: %ld KiB (nginx and the host); %d calls, slowest %ld ms\n",
               memory_kib, answered.load(), slowest_ms.load());
 }
