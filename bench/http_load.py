@@ -1,5 +1,7 @@
-"""The host's HTTP server under load: "list" next to a static file of the same
-size from the same server, with wrk, and the server's resident memory."""
+"""The server under load through its nginx: "list" next to the smallest answer
+the host gives through the same nginx (a call refused for want of a token) and
+to a static file of the same size from nginx itself, with wrk; and the memory
+of the host and nginx together."""
 
 import http.client
 import os
@@ -35,12 +37,19 @@ def _free_port():
         return probe.getsockname()[1]
 
 
-def resident_kib(pid):
-    with open("/proc/%d/status" % pid) as status:
-        for line in status:
-            if line.startswith("VmRSS:"):
+def proportional_kib(pid):
+    """The proportional set size of `pid`: pages shared with other processes
+    (nginx's master and worker share most) count in part."""
+    with open("/proc/%d/smaps_rollup" % pid) as rollup:
+        for line in rollup:
+            if line.startswith("Pss:"):
                 return int(line.split()[1])
-    raise RunFailed("no VmRSS for %d" % pid)
+    raise RunFailed("no Pss for %d" % pid)
+
+
+def process_group(pid):
+    with open("/proc/%d/stat" % pid) as stat:
+        return int(stat.read().rsplit(")", 1)[1].split()[2])
 
 
 class Server:
@@ -51,6 +60,7 @@ class Server:
         self.root = root
         self.web = os.path.join(work, "web")
         os.makedirs(self.web, exist_ok=True)
+        os.chmod(work, 0o755)  # nginx's workers run as nobody under root
         self.port = _free_port()
         self.base = "http://127.0.0.1:%d" % self.port
         with open(os.path.join(root, "usr/orva/etc/webapi.token")) as token:
@@ -88,8 +98,19 @@ class Server:
             static.write(body)
         return self.base + "/" + STATIC_NAME
 
-    def resident_kib(self):
-        return resident_kib(self.process.pid)
+    def memory_kib(self):
+        """The host and every nginx process (those in the group of its master)."""
+        pid_file = os.path.join(self.root, "usr/orva/var/webapi/nginx.pid")
+        with open(pid_file) as pid:
+            master = int(pid.read())
+        kib = proportional_kib(self.process.pid)
+        for entry in os.listdir("/proc"):
+            try:
+                if entry.isdigit() and process_group(int(entry)) == master:
+                    kib += proportional_kib(int(entry))
+            except (OSError, ValueError):
+                pass  # a process that ended meanwhile
+        return kib
 
     def send_requests(self, path, count, clients):
         """Sends exactly `count` GET requests for `path` over `clients` kept-alive
@@ -134,13 +155,17 @@ class Server:
 class Load:
     """The figures of one wrk run."""
 
-    def __init__(self, fields):
+    def __init__(self, fields, refused):
         self.requests = int(fields["requests"])
         self.seconds = int(fields["duration_us"]) / 1e6
         self.per_second = self.requests / self.seconds if self.seconds else 0.0
         self.p50_ms = int(fields["p50_us"]) / 1000.0
         self.p99_ms = int(fields["p99_us"]) / 1000.0
-        self.errors = int(fields["status_errors"]) + int(fields["socket_errors"])
+        # A refused call must be refused every time.
+        answers_off = int(fields["status_errors"])
+        if refused:
+            answers_off = self.requests - answers_off
+        self.errors = answers_off + int(fields["socket_errors"])
 
 
 class MedianLoad:
@@ -154,10 +179,14 @@ class MedianLoad:
 
 
 def wrk(url, token, clients, seconds, script):
-    """One wrk run; at most two threads, as the machine has two cores."""
+    """One wrk run; at most two threads, as the machine has two cores. Without
+    `token` every answer must be a refusal."""
     program = shutil.which("wrk")
     threads = min(clients, 2)
-    env = dict(os.environ, ORVA_BENCH_TOKEN=token)
+    env = dict(os.environ)
+    env.pop("ORVA_BENCH_TOKEN", None)
+    if token:
+        env["ORVA_BENCH_TOKEN"] = token
     out = subprocess.run([program, "-t%d" % threads, "-c%d" % clients, "-d%ds" % seconds,
                           "--timeout", "10s", "-s", script, url],
                          env=env, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE,
@@ -165,7 +194,7 @@ def wrk(url, token, clients, seconds, script):
     match = _WRK_LINE.search(out)
     if match is None:
         raise RunFailed("wrk gave no figures:\n" + out[-800:])
-    load = Load(dict(item.split("=") for item in match.group(1).split()))
+    load = Load(dict(item.split("=") for item in match.group(1).split()), not token)
     if load.errors:
         raise RunFailed("wrk saw %d failed requests on %s:\n%s" % (load.errors, url, out[-800:]))
     return load

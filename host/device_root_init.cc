@@ -96,6 +96,10 @@ std::string TokenPath(const std::string& root) {
   return root + "/usr/orva/etc/webapi.token";
 }
 
+std::string AcmeChallengeFolder(const std::string& root) {
+  return root + "/usr/orva/etc/ssl/acme-challenge";
+}
+
 bool InitDeviceRoot(const std::string& root, std::string* error) {
   const char* kDirectories[] = {
       "/usr/orva/bin",           "/usr/orva/etc/ssl",
@@ -105,6 +109,7 @@ bool InitDeviceRoot(const std::string& root, std::string* error) {
   for (const char* directory : kDirectories) {
     if (!MakeFolder(root + directory, error)) return false;
   }
+  if (!MakeFolder(AcmeChallengeFolder(root), error)) return false;
   if (!LinkTool(root, "openssl", error) || !LinkTool(root, "7z", error)) {
     return false;
   }

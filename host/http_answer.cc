@@ -1,7 +1,6 @@
 #include "host/http_answer.h"
 
 #include <cctype>
-#include <memory>
 #include <string>
 #include <utility>
 
@@ -38,22 +37,6 @@ bool HasLineBreak(const std::string& text) {
   return text.find_first_of("\r\n") != std::string::npos;
 }
 
-// Sets the body, running `afterSent` once it has been written.
-void SetBody(std::string body, const std::string& type,
-             std::function<void()> afterSent, httplib::Response* response) {
-  if (!afterSent) {
-    response->set_content(std::move(body), type);
-    return;
-  }
-  auto shared = std::make_shared<const std::string>(std::move(body));
-  response->set_content_provider(
-      shared->size(), type,
-      [shared](size_t offset, size_t length, httplib::DataSink& sink) {
-        return sink.write(shared->data() + offset, length);
-      },
-      [afterSent](bool) { afterSent(); });
-}
-
 }  // namespace
 
 void WriteHostFailure(int status, httplib::Response* response) {
@@ -61,11 +44,10 @@ void WriteHostFailure(int status, httplib::Response* response) {
   response->set_content(ToOneLineJson(HostFailure(status).answer), kJsonType);
 }
 
-void WriteCallOutcome(const CallOutcome& outcome, std::function<void()> afterSent,
-                      httplib::Response* response) {
+void WriteCallOutcome(const CallOutcome& outcome, httplib::Response* response) {
   response->status = outcome.http_status;
   if (!outcome.is_download) {
-    SetBody(ToOneLineJson(outcome.answer), kJsonType, std::move(afterSent), response);
+    response->set_content(ToOneLineJson(outcome.answer), kJsonType);
     return;
   }
   std::string type = TypeOfOfferedFile(OfferedFileName(outcome.download));
@@ -81,5 +63,5 @@ void WriteCallOutcome(const CallOutcome& outcome, std::function<void()> afterSen
       response->set_header(header.first, header.second);
     }
   }
-  SetBody(outcome.download.body, type, std::move(afterSent), response);
+  response->set_content(outcome.download.body, type);
 }

@@ -8,9 +8,7 @@
 
 namespace {
 
-constexpr int kLengthRequired = 411;
 constexpr int kUnauthorized = 401;
-constexpr int kPayloadTooLarge = 413;
 constexpr int kServerError = 500;
 
 constexpr time_t kReadTimeoutSeconds = 30;
@@ -20,14 +18,26 @@ constexpr size_t kWorkerThreads = 16;
 
 constexpr char kWebapiPath[] = "/webapi";
 
+const char* CertificateText(FrontServer::Certificate certificate) {
+  switch (certificate) {
+    case FrontServer::Certificate::kNew:
+      return "new";
+    case FrontServer::Certificate::kPrevious:
+      return "previous";
+    case FrontServer::Certificate::kNone:
+      break;
+  }
+  return "none";
+}
+
 }  // namespace
 
 WebapiService::WebapiService(std::vector<ORVA::APITable> tables,
-                             AccessToken token, StaticFiles web,
-                             std::function<void()> restart, CallOrder* order)
+                             AccessToken token,
+                             std::function<FrontServer::Certificate()> restart,
+                             CallOrder* order)
     : tables_(std::move(tables)),
       token_(token),
-      web_(std::move(web)),
       restart_(std::move(restart)),
       order_(order) {}
 
@@ -47,22 +57,11 @@ void WebapiService::Install(httplib::Server* server) {
       [this](const Request& request, Response& response) {
         return Guard(request, &response);
       });
-  // A client that waits for "100 Continue" learns of an oversized body
-  // before it sends it.
-  server->set_expect_100_continue_handler([](const Request& request, Response& response) {
-    if (request.get_header_value<uint64_t>("Content-Length") <= kMaxBodyBytes) return 100;
-    response.set_header("Connection", "close");
-    WriteHostFailure(kPayloadTooLarge, &response);
-    return kPayloadTooLarge;
-  });
   server->Get(kWebapiPath, [this](const Request& request, Response& response) {
     ServeWebapi(request, &response);
   });
   server->Post(kWebapiPath, [this](const Request& request, Response& response) {
     ServeWebapi(request, &response);
-  });
-  server->Get("/.*", [this](const Request& request, Response& response) {
-    web_.Serve(request, &response);
   });
   server->set_error_handler(httplib::Server::HandlerWithResponse(
       [](const Request&, Response& response) {
@@ -77,19 +76,14 @@ void WebapiService::Install(httplib::Server* server) {
 
 httplib::Server::HandlerResponse WebapiService::Guard(
     const httplib::Request& request, httplib::Response* response) const {
-  int refusal = 0;
-  if (request.has_header("Transfer-Encoding")) {
-    refusal = kLengthRequired;
-  } else if (request.path == kWebapiPath &&
-             !token_.Accepts(request.get_header_value("Authorization"))) {
-    refusal = kUnauthorized;
-    response->set_header("WWW-Authenticate", "Bearer");
+  if (token_.Accepts(request.get_header_value("Authorization"))) {
+    return httplib::Server::HandlerResponse::Unhandled;
   }
-  if (refusal == 0) return httplib::Server::HandlerResponse::Unhandled;
   // The body is never read: the client must not send another request on
   // this connection.
+  response->set_header("WWW-Authenticate", "Bearer");
   response->set_header("Connection", "close");
-  WriteHostFailure(refusal, response);
+  WriteHostFailure(kUnauthorized, response);
   return httplib::Server::HandlerResponse::Handled;
 }
 
@@ -104,7 +98,10 @@ void WebapiService::ServeWebapi(const httplib::Request& request,
     return;
   }
   CallOutcome outcome = Dispatch(call);
-  WriteCallOutcome(outcome, outcome.httpd_restart ? restart_ : nullptr, response);
+  if (outcome.httpd_restart && restart_) {
+    response->set_header(kCertificateHeader, CertificateText(restart_()));
+  }
+  WriteCallOutcome(outcome, response);
 }
 
 CallOutcome WebapiService::Dispatch(const WebapiCall& call) {

@@ -10,31 +10,32 @@
 #include "host/access_token.h"
 #include "host/api_call.h"
 #include "host/call_order.h"
+#include "host/front_server.h"
 #include "host/request_parsing.h"
-#include "host/static_files.h"
 #include "platform/webapi/api_table.h"
 
-// What the HTTP and the HTTPS listener serve: GET and POST /webapi for the
-// loaded modules' methods, behind the access token, and the web page's
-// files at every other path, without it.
+// The host's own listener, behind nginx: GET and POST /webapi for the
+// loaded modules' methods, behind the access token. nginx holds the limits
+// of the network side and hands over whole request bodies.
 //
-// Before any body is read, a request with a Transfer-Encoding is refused
-// with 411 (its size is not known in advance) and a /webapi request without
-// the right "Authorization: Bearer TOKEN" with 401; both close the
-// connection. A body over kMaxBodyBytes is refused with 413. Every
-// host-level failure is answered in the JSON shape of a module's error with
-// the HTTP status as its code.
+// A request without the right "Authorization: Bearer TOKEN" is refused with
+// 401 before its body is read, and the connection closed. A body over
+// kMaxBodyBytes is refused with 413. Every host-level failure is answered
+// in the JSON shape of a module's error with the HTTP status as its code.
 class WebapiService {
  public:
   static constexpr size_t kMaxBodyBytes = 4 * 1024 * 1024;
+  // The header that tells, on the answer to a call that asked for a web
+  // server restart, which certificate HTTPS presents now: "new",
+  // "previous" (the store's pair did not load) or "none" (HTTPS is off).
+  static constexpr char kCertificateHeader[] = "X-Web-Certificate";
 
   // `tables`: the loaded modules' API tables, searched in order; the
-  // modules must outlive this object. `restart`, when set, is called after
-  // the answer to a call whose handler asked for a web server restart has
-  // been sent. Calls take their turns in `order`, which must outlive this
-  // object.
+  // modules must outlive this object. `restart`, when set, is called when a
+  // handler asks for a web server restart, before its answer is sent. Calls
+  // take their turns in `order`, which must outlive this object.
   WebapiService(std::vector<ORVA::APITable> tables, AccessToken token,
-                StaticFiles web, std::function<void()> restart, CallOrder* order);
+                std::function<FrontServer::Certificate()> restart, CallOrder* order);
 
   WebapiService(const WebapiService&) = delete;
   WebapiService& operator=(const WebapiService&) = delete;
@@ -51,8 +52,7 @@ class WebapiService {
 
   const std::vector<ORVA::APITable> tables_;
   const AccessToken token_;
-  const StaticFiles web_;
-  const std::function<void()> restart_;
+  const std::function<FrontServer::Certificate()> restart_;
   CallOrder* const order_;
 };
 

@@ -10,12 +10,19 @@ struct ListenAddress {
 };
 
 // Parses "HOST:PORT" or "[IPV6]:PORT" (port 0 to 65535, decimal digits
-// only). Returns false, leaving *address untouched, for anything else.
+// only; the host of letters, digits, ".", "-" and, in brackets, ":").
+// Returns false, leaving *address untouched, for anything else.
 bool ParseListenAddress(const std::string& text, ListenAddress* address);
 
 // The URL of `path` (starting with "/") on `host` and `port` for `scheme`
 // ("http" or "https"); an IPv6 literal is written in brackets.
 std::string ListenUrl(const std::string& scheme, const std::string& host,
                       int port, const std::string& path);
+
+// A TCP port on `host` that nothing is bound to at the moment of the call
+// (the system's choice for port 0), or -1 when `host` does not resolve or
+// no socket binds there. Another program may take it before the caller
+// binds it: a caller that cannot bind it itself passes it on at once.
+int FreeTcpPort(const std::string& host);
 
 #endif  // ORVA_HOST_LISTEN_ADDRESS_H_

@@ -1,5 +1,4 @@
-// The host's parts whose order a running server shows only by timing: the
-// order of calls, and when the HTTPS listener reads the store.
+// The order of calls, which a running server shows only by timing.
 
 #include <sys/syscall.h>
 #include <unistd.h>
@@ -15,9 +14,7 @@
 #include <gtest/gtest.h>
 
 #include "host/call_order.h"
-#include "host/https_listener.h"
 #include "tests/host/serve_process.h"
-#include "tests/support/certificates.h"
 
 namespace {
 
@@ -89,25 +86,4 @@ TEST(CallOrder, ListNeverWaitsAndChangesStartOneAtATimeInTheOrderTheyCame) {
     EXPECT_EQ(expected, started);
   }
   for (std::thread& call : calls) call.join();
-}
-
-TEST(HttpsListener, ReloadReadsTheStoreOnlyOnceTheChangeUnderWayIsDone) {
-  TempDeviceRoot scratch;
-  const std::string key = scratch.Path("/usr/orva/etc/ssl/ssl.key/server.key");
-  const std::string crt = scratch.Path("/usr/orva/etc/ssl/ssl.crt/server.crt");
-  scratch.WriteFile("/usr/orva/etc/orva.conf", "runHTTPS=\"yes\"\n");
-  ASSERT_TRUE(MakeSelfSignedCa(key, crt, "/CN=first.test"));
-  CallOrder order;
-  HttpsListener https({"127.0.0.1", 0}, [](httplib::Server*) {}, &order);
-  https.Start();
-  const int port = https.port();
-  ASSERT_EQ("CN = first.test\n", PresentedSubjects(port));
-  {
-    CallOrder::Turn changing(&order);
-    scratch.WriteFile("/usr/orva/etc/ssl/ssl.crt/server.crt", "half written\n");
-    https.RequestReload();
-    ASSERT_TRUE(OtherThreadsSleep());
-    ASSERT_TRUE(MakeSelfSignedCa(key, crt, "/CN=second.test"));
-  }
-  EXPECT_TRUE(WaitFor([&] { return PresentedSubjects(port) == "CN = second.test\n"; }));
 }

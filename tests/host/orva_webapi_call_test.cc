@@ -34,7 +34,7 @@ TEST(OrvaWebapiCommands, InitMakesAPrivateTokenOnceCallAnswersAndServeRefusesBad
             RunHost(scratch, "call " + root + " ORVA.Core.Certificate delete"));
   EXPECT_EQ("exit 1\n", RunHost(scratch, "call --root '" + scratch.Path("/nowhere") +
                                              "' ORVA.Core.Certificate list"));
-  for (const char* address : {"localhost:65536", "localhost:80a", "localhost:", "::1:8080"}) {
+  for (const char* address : {"localhost:65536", "localhost:80a", "localhost:", "::1:8080", "a}b:80"}) {
     EXPECT_EQ("exit 2\n", RunHost(scratch, "serve " + root + " --listen " + address)) << address;
   }
   const std::string ssl = scratch.Path("/device/usr/orva/etc/ssl");

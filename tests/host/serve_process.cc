@@ -6,9 +6,12 @@
 #include <signal.h>
 #include <sys/prctl.h>
 #include <sys/socket.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
+#include <cctype>
 #include <chrono>
 #include <cstdio>
 #include <filesystem>
@@ -67,6 +70,7 @@ int ServeProcess::Stop(int signalNumber) {
   int status = 0;
   const bool exited = WaitFor([&] { return waitpid(pid_, &status, WNOHANG) == pid_; });
   if (!exited) {
+    if (NginxPid() > 0) kill(-NginxPid(), SIGKILL);
     kill(pid_, SIGKILL);
     waitpid(pid_, &status, 0);
   }
@@ -87,10 +91,38 @@ httplib::Client ServeProcess::AuthorizedClient() const {
   return client;
 }
 
+pid_t ServeProcess::NginxPid() const {
+  return std::atoi(ReadFile(root_ + "/usr/orva/var/webapi/nginx.pid").c_str());
+}
+
+long ServeProcess::MemoryKib() const {
+  auto proportional_kib = [](const std::string& pid) {
+    const std::string rollup = ReadFile("/proc/" + pid + "/smaps_rollup");
+    const std::string::size_type at = rollup.find("\nPss:");
+    return at == std::string::npos ? 0L : std::atol(rollup.c_str() + at + 5);
+  };
+  long kib = proportional_kib(std::to_string(pid_));
+  const pid_t nginx = NginxPid();
+  std::error_code error;
+  for (const auto& process : std::filesystem::directory_iterator("/proc", error)) {
+    // nginx's processes are in the group of its master: "PID (COMM) S PPID PGRP".
+    if (!std::isdigit(process.path().filename().string()[0])) continue;
+    const std::string stat = ReadFile(process.path().string() + "/stat");
+    int group = 0;
+    if (std::sscanf(stat.c_str() + std::min(stat.size(), stat.rfind(')') + 1), " %*c %*d %d",
+                    &group) == 1 && nginx > 0 && group == nginx) {
+      kib += proportional_kib(process.path().filename().string());
+    }
+  }
+  return kib;
+}
+
 std::string ServeProcess::Output() const { return ReadFile(root_ + "/serve.out"); }
 std::string ServeProcess::Log() const { return ReadFile(root_ + "/serve.err"); }
 
 void ServeTest::SetUp() {
+  // nginx's workers run as nobody when the tests run as root.
+  chmod(scratch_.root().c_str(), 0755);
   std::string error;
   ASSERT_TRUE(InitDeviceRoot(scratch_.root(), &error)) << error;
 }
@@ -110,10 +142,10 @@ int CountFiles(const std::string& folder) {
   return error ? -1 : static_cast<int>(std::distance(entries, {}));
 }
 
-std::string PresentedSubjects(int port) {
+std::string PresentedSubjects(int port, const std::string& options) {
   // The tool lists the chain it was sent as lines " N s:SUBJECT".
   const std::string command = "openssl s_client -connect 127.0.0.1:" + std::to_string(port) +
-                              " </dev/null 2>/dev/null";
+                              " " + options + " </dev/null 2>/dev/null";
   std::unique_ptr<FILE, int (*)(FILE*)> tool(popen(command.c_str(), "r"), pclose);
   std::string subjects;
   char line[4096];

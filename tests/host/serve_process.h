@@ -15,9 +15,9 @@
 
 inline constexpr char kListQuery[] = "/webapi?api=ORVA.Core.Certificate&method=list";
 
-// A real "orva-webapi serve" on loopback for one test: started on free
-// ports with the test module loaded, and stopped (SIGTERM, then SIGKILL)
-// when the object goes away, whatever the test did. Its standard output and
+// A real "orva-webapi serve" on loopback for one test, with its nginx:
+// started on free ports with the test module loaded, and stopped (SIGTERM,
+// then SIGKILL for both) when the object goes away, whatever the test did. Its standard output and
 // error go to files in the device root, its temporary uploads to
 // `UploadFolder()`.
 class ServeProcess {
@@ -44,6 +44,12 @@ class ServeProcess {
   // exit status, or -1 when the server was killed or had to be.
   int Stop(int signalNumber);
 
+  // nginx's master process (0 when it has none).
+  pid_t NginxPid() const;
+  // The proportional set size, in KiB, of the server and every nginx
+  // process: pages that nginx's master and workers share count once.
+  long MemoryKib() const;
+
   std::string Output() const;  // standard output so far
   std::string Log() const;     // standard error (the syslog copy) so far
 
@@ -69,8 +75,8 @@ int CountFiles(const std::string& folder);
 
 // The subjects of the certificates that a new TLS handshake with
 // 127.0.0.1:PORT presents, leaf first, one "CN = name" line each; "" when
-// the handshake fails.
-std::string PresentedSubjects(int port);
+// the handshake fails. `options` are further options of "openssl s_client".
+std::string PresentedSubjects(int port, const std::string& options = "");
 
 // A TCP connection to 127.0.0.1:PORT that has sent `request` as it stands
 // (nothing when it could not connect).

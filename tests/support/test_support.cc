@@ -6,7 +6,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
-#include <iterator>
+#include <sstream>
 #include <stdexcept>
 
 #include <gtest/gtest.h>
@@ -59,7 +59,11 @@ const std::string& LogCapture::Text() {
 
 std::string ReadFile(const std::string& path) {
   std::ifstream file(path, std::ios::binary);
-  return std::string(std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>());
+  // A read that fails half-way (a /proc file of a thread or process that
+  // just ended) ends the text there; the buffer's own reading would throw.
+  std::ostringstream content;
+  content << file.rdbuf();
+  return content.str();
 }
 
 void MakeDirs(const std::string& path) {

@@ -6,7 +6,7 @@
 import assert from 'node:assert/strict';
 import { execFile, spawn } from 'node:child_process';
 import { once } from 'node:events';
-import { mkdtemp, readFile, rm } from 'node:fs/promises';
+import { chmod, mkdtemp, readFile, rm } from 'node:fs/promises';
 import os from 'node:os';
 import path from 'node:path';
 import { createInterface } from 'node:readline';
@@ -23,6 +23,7 @@ const WAIT = { timeout: 60_000 };
 // `t`. All goes away when the test ends, the browser before the server.
 async function openDevice(t) {
   const folder = await mkdtemp(path.join(os.tmpdir(), 'orva-web-test-'));
+  await chmod(folder, 0o755);  // nginx's workers run as nobody when the tests run as root
   let browser = null;
   let server = null;
   t.after(async () => {

@@ -64,6 +64,15 @@ async function refreshTable(retries = 0) {
 // shows the new table. Returns the sentence for the form.
 function installed(data) {
   pageNotice.hidden = true;
+  if (data?.restart_httpd === true && data.web_certificate === 'previous') {
+    pageNotice.textContent = 'The management web server did not take the new certificate: it ' +
+      'could not load it, and keeps presenting the previous one. Its key must be at least ' +
+      '2048 bits (RSA) or 256 bits (EC).';
+    pageNotice.hidden = false;
+    refreshTable();
+    return 'The device’s secure services restarted with it; the management web server did not ' +
+      'take it.';
+  }
   if (data?.restart_httpd === true) {
     pageNotice.textContent = 'The management web server is restarting with the new ' +
       'certificate. If the page stops answering, wait a moment and reload it; the browser ' +

@@ -26,7 +26,6 @@ const MODULE_ERRORS = {
 const HOST_ERRORS = {
   400: 'The device refused the request as malformed. Reload the page and try again.',
   404: 'The device does not offer this function. Its software may be older than this page.',
-  411: 'The device refused a request sent without its length. Reload the page and try again.',
   413: 'The files are too large to upload. Certificates and keys are a few kilobytes.',
   500: 'The device could not finish the request.',
 };

@@ -4,6 +4,10 @@
 
 const ENDPOINT = '/webapi';
 const VERSION = '1';
+// On the answer to a call that installed a certificate: which one the web
+// server presents now ('new', 'previous' when the new one did not load, or
+// 'none' without HTTPS).
+const CERTIFICATE_HEADER = 'X-Web-Certificate';
 
 // Why a call failed. `kind` is 'module' (the method answered an error code),
 // 'host' (the server refused the request; `code` is the HTTP status),
@@ -57,10 +61,14 @@ export class WebApi {
     this.tokens = tokens;
   }
 
-  // Resolves with the method's data; rejects with an ApiError.
+  // Resolves with the method's data, with `web_certificate` added from the
+  // header when the device sent it; rejects with an ApiError.
   async call(api, method, params = {}, files = {}) {
     const response = await this.send(requestBody(api, method, params, files));
-    return readAnswer(response);
+    const data = await readAnswer(response);
+    const certificate = response.headers.get(CERTIFICATE_HEADER);
+    return certificate && data !== null && typeof data === 'object'
+      ? { ...data, web_certificate: certificate } : data;
   }
 
   // Asks the export method for a set ("archive", "csr_set", "signed_set").
