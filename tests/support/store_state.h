@@ -16,6 +16,9 @@ inline constexpr char kStore[] = "/usr/orva/etc/ssl";
 struct StoreFile {
   std::string content;
   mode_t mode;
+  bool operator==(const StoreFile& other) const {
+    return content == other.content && mode == other.mode;
+  }
 };
 // Every file under the store by its path relative to the store (for
 // example "ssl.key/server.key").

@@ -1,4 +1,4 @@
-// Keys: refused sizes, and output of the tool that is installed only whole.
+// Keys: output of the tool is installed only whole.
 
 #include <string>
 
@@ -8,18 +8,6 @@
 #include "tests/support/certificates.h"
 #include "tests/support/store_state.h"
 #include "toolkit/mkcert.h"
-
-TEST(GenKey, RefusesSizesOfZeroAndAboveTheLimitBeforeAnythingRuns) {
-  TempDeviceRoot root;
-  root.WriteScript("/usr/orva/bin/openssl", "touch \"$ORVA_ROOT/ran\"; exit 1");
-  for (unsigned int bits : {0u, 16385u, 0xFFFFFFFFu}) {
-    SCOPED_TRACE(bits);
-    LogCapture log;
-    EXPECT_EQ(-1, genKey(root.Path(kServerKeyPath).c_str(), bits));
-    EXPECT_TRUE(log.Contains(" genKey sanity failed\n")) << log.Text();
-    EXPECT_FALSE(FileExists(root.Path("/ran")));
-  }
-}
 
 // The stand-in writes a whole key to the file after "-out", or nothing, as
 // on a full disk, and exits with the status given.
