@@ -1,8 +1,11 @@
 #include "tests/support/certificates.h"
 
+#include <openssl/pem.h>
+
 #include <cstdio>
 #include <cstdlib>
 
+#include "common/raii.h"
 #include "tests/support/test_support.h"
 
 namespace {
@@ -72,4 +75,22 @@ bool MakeChain(const std::string& folder, const std::string& subject, int bits) 
                                at + "inter.crt", "/CN=Intermediate", bits) &&
          MakeSignedCertificate(at + "inter.key", at + "inter.crt", at + "server.key",
                                at + "server.crt", subject, bits);
+}
+
+std::string PemText(const std::string& path) {
+  BioPtr text(BIO_new(BIO_s_mem()));
+  FilePtr file(std::fopen(path.c_str(), "r"));
+  if (!file || !text) return "";
+  X509Ptr certificate(PEM_read_X509(file.get(), nullptr, nullptr, nullptr));
+  if (certificate) {
+    X509_print(text.get(), certificate.get());
+  } else {
+    std::rewind(file.get());
+    X509_REQ* request = PEM_read_X509_REQ(file.get(), nullptr, nullptr, nullptr);
+    if (request != nullptr) X509_REQ_print(text.get(), request);
+    X509_REQ_free(request);
+  }
+  char* data = nullptr;
+  long size = BIO_get_mem_data(text.get(), &data);
+  return std::string(data, static_cast<size_t>(size));
 }

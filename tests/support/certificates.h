@@ -30,6 +30,11 @@ bool MakeRequest(const std::string& keyPath, const std::string& csrPath,
 // server.key, server.crt (`subject`, by the intermediate).
 bool MakeChain(const std::string& folder, const std::string& subject, int bits = 2048);
 
+// The first certificate, or else the first certificate signing request, of
+// the PEM file at `path` as the OpenSSL library prints it ("Subject: C=TW,
+// O=...", "Public-Key: (2048 bit)", alternative names); "" for neither.
+std::string PemText(const std::string& path);
+
 // Runs a shell command line for test set-up, without input or output;
 // true when it exited with 0.
 bool RunForTest(const std::string& commandLine);
