@@ -20,7 +20,7 @@ bool Shows(const std::string& path, const std::string& text) {
 }
 
 // Both subjects of CRT create, the CA's named "Local Root", changed by the
-// JSON object `changes`, where "ROOT" stands for the device root.
+// JSON object `changes` (null removes), where "ROOT" stands for the device root.
 Json::Value Params(const TempDeviceRoot& root, std::string changes = "{}") {
   for (size_t at; (at = changes.find("ROOT")) != std::string::npos;) {
     changes.replace(at, 4, root.root());
@@ -29,16 +29,19 @@ Json::Value Params(const TempDeviceRoot& root, std::string changes = "{}") {
   Json::Reader().parse(changes, changed);
   ca["ca_common_name"] = "Local Root";
   for (const std::string& name : ca.getMemberNames()) params[name] = ca[name];
-  for (const std::string& name : changed.getMemberNames()) params[name] = changed[name];
+  for (const std::string& name : changed.getMemberNames()) {
+    if (changed[name].isNull()) params.removeMember(name);
+    if (!changed[name].isNull()) params[name] = changed[name];
+  }
   return params;
 }
 
 }  // namespace
 
-// Everything a method would refuse half-way, or that no HTTPS could use, is
-// refused before the first write: every key, request and certificate stays
-// and nothing is activated. CRT create checks the CA's key size before the
-// CA's subject.
+// A necessary parameter missing or not of its kind (5503), and everything a
+// method would refuse half-way or that no HTTPS could use, is refused
+// before the first write: the store stays as it was and nothing is
+// activated. CRT create checks the CA's key size before the CA's subject.
 TEST(Refusals, LeaveTheStoreAsItWasAndActivateNothing) {
   TempDeviceRoot root;
   ASSERT_NO_FATAL_FAILURE(InstallOldStore(root));
@@ -53,8 +56,19 @@ TEST(Refusals, LeaveTheStoreAsItWasAndActivateNothing) {
   std::string many_names;
   for (int i = 0; i <= 100; ++i) many_names += "n" + std::to_string(i) + ".local;";
   const auto crt = doCertificateCreateCRT_v1, sign = doCertificateSign_v1;
+  const auto import = doCertificateImport_v1;
   const struct { MethodHandler method; std::string changes; int code; const char* logged; }
   cases[] = {
+      {crt, R"({"email":null})", 5503, ""},
+      {crt, R"({"ca_department":null})", 5503, ""},
+      {doCertificateCreateCSR_v1, R"({"email":null})", 5503, ""},
+      {sign, R"({"csr":"l.csr","csr_tmp":"ROOT/outside/laptop.csr"})", 5503, ""},
+      {sign, R"({"days":"TW","csr":"l.csr","csr_tmp":"ROOT/outside/laptop.csr"})", 5503, ""},
+      {sign, R"({"days":"9","csr_tmp":"ROOT/outside/laptop.csr"})", 5503, ""},
+      {import, R"({"key_tmp":"ROOT/outside/server.key"})", 5503, ""},
+      {import, R"({"cert_tmp":"ROOT/outside/server.crt"})", 5503, ""},
+      {doCertificateExport_v1, "{}", 5503, ""},
+      {doCertificateList_v1, R"({"type":"server_cert","additional":"TW"})", 5503, ""},
       {crt, R"({"ca_country":"TWN"})", 5503, ""},
       {crt, R"({"ca_key_length":"0","ca_country":"TWN"})", 5501, ""},
       {crt, R"({"country":"T"})", 5501, ""},
@@ -74,8 +88,7 @@ TEST(Refusals, LeaveTheStoreAsItWasAndActivateNothing) {
       {sign, R"({"days":"9","csr":"c.pem","csr_tmp":"ROOT/outside/certificate.pem"})", 5519, ""},
       {sign, R"({"days":"825","csr":"l.csr","csr_tmp":"ROOT/outside/laptop.csr"})", 5501,
        "The certificate would name no host"},
-      {doCertificateImport_v1,
-       R"({"cert_tmp":"ROOT/outside/small.crt","key_tmp":"ROOT/outside/small.key"})", 5514,
+      {import, R"({"cert_tmp":"ROOT/outside/small.crt","key_tmp":"ROOT/outside/small.key"})", 5514,
        "The key has 1024 bits: the device's HTTPS needs RSA keys of at least 2048 bits"},
   };
   for (const auto& c : cases) {
