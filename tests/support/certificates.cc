@@ -68,15 +68,6 @@ bool MakeSignedCertificate(const std::string& caKeyPath, const std::string& caCe
   return made;
 }
 
-bool MakeChain(const std::string& folder, const std::string& subject, int bits) {
-  const std::string at = folder + "/";
-  return MakeSelfSignedCa(at + "root.key", at + "root.crt", "/CN=Root", bits) &&
-         MakeSignedCertificate(at + "root.key", at + "root.crt", at + "inter.key",
-                               at + "inter.crt", "/CN=Intermediate", bits) &&
-         MakeSignedCertificate(at + "inter.key", at + "inter.crt", at + "server.key",
-                               at + "server.crt", subject, bits);
-}
-
 std::string PemText(const std::string& path) {
   BioPtr text(BIO_new(BIO_s_mem()));
   FilePtr file(std::fopen(path.c_str(), "r"));

@@ -25,11 +25,6 @@ bool MakeSignedCertificate(const std::string& caKeyPath, const std::string& caCe
 bool MakeRequest(const std::string& keyPath, const std::string& csrPath,
                  const std::string& subject, int bits = 2048);
 
-// An issuing chain of RSA keys of `bits` in `folder`: root.key, root.crt
-// ("/CN=Root"); inter.key, inter.crt ("/CN=Intermediate", by the root);
-// server.key, server.crt (`subject`, by the intermediate).
-bool MakeChain(const std::string& folder, const std::string& subject, int bits = 2048);
-
 // The first certificate, or else the first certificate signing request, of
 // the PEM file at `path` as the OpenSSL library prints it ("Subject: C=TW,
 // O=...", "Public-Key: (2048 bit)", alternative names); "" for neither.
