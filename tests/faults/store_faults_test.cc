@@ -229,13 +229,15 @@ TEST_F(MountedStoreFaults, DiskFullAtAnyOpensslRunOrCopyLeavesTheStoreWhole) {
 }
 
 // A rename that fails at any step of a set's install (a folder in the way
-// of one target) puts back every file the set had replaced.
+// of one target) puts back every file the set had replaced; one that fails
+// for a configuration file leaves no temporary file.
 TEST_F(StoreFaults, RenameFailingAtAnyStepPutsTheOldSetBack) {
   const std::pair<const char*, const char*> cases[] = {
       {"ssl.csr/ca.csr", "CRT create"},     {"ssl.crt/ca.crt", "CRT create"},
       {"ssl.crt/server.crt", "CRT create"}, {"ssl.key/ca.key", "CRT create"},
       {"ssl.key/server.key", "CRT create"}, {"ssl.intercrt/server-ca.crt", "CRT create"},
       {".gen/server.csr", "CSR create"},    {".gen/server.key", "CSR create"},
+      {"cfg.d/ca.cfg", "CSR create"},
       {"ssl.crt/server.crt", "import"},     {"ssl.intercrt/server-ca.crt", "import"},
   };
   for (const auto& [target, name] : cases) {

@@ -4,6 +4,7 @@
 #include <sys/types.h>
 
 #include <map>
+#include <ostream>
 #include <string>
 
 #include "tests/support/test_support.h"
@@ -18,6 +19,10 @@ struct StoreFile {
   mode_t mode;
   bool operator==(const StoreFile& other) const {
     return content == other.content && mode == other.mode;
+  }
+  // Failures name a file's size and mode, not its bytes.
+  friend void PrintTo(const StoreFile& file, std::ostream* out) {
+    *out << file.content.size() << " bytes, mode " << std::oct << file.mode << std::dec;
   }
 };
 // Every file under the store by its path relative to the store (for
