@@ -104,6 +104,7 @@ TEST(CsrRenew, RepeatsTheInstalledSubjectAndKeySize) {
     EXPECT_TRUE(Shows(root.Path(kGenCsrPath), std::string("Subject: ") + c.shown + "\n"))
         << PemText(root.Path(kGenCsrPath));
     EXPECT_TRUE(Shows(root.Path(kGenCsrPath), std::string("Public-Key: ") + c.renewed));
+    EXPECT_EQ(0700, FileMode(root.Path(kGenDir))) << "the pending key's folder is private";
     ExpectStoreWhole(root, {});
   }
 }
