@@ -25,7 +25,6 @@
 #include <iterator>
 #include <string>
 
-#include "fuzz/fuzz_scratch.h"
 #include "host/http_server.h"
 #include "host/request_parsing.h"
 #include "host/temporary_uploads.h"
@@ -72,15 +71,18 @@ class RequestReader : public httplib::Server {
   }
 };
 
-// The uploads are saved where TMPDIR points.
+// The uploads are saved where TMPDIR points: a private folder of this
+// process, empty after every call (CheckCall proves it) and removed at exit.
 const std::string& UploadFolder() {
-  static const std::string folder = [] {
-    const std::string path = ScratchRoot() + "/uploads";
-    if (!std::filesystem::create_directory(path)) std::abort();
-    setenv("TMPDIR", path.c_str(), 1);
-    return path;
-  }();
-  return folder;
+  static const struct Folder {
+    Folder() : path((std::filesystem::temp_directory_path() / "orva-fuzz-XXXXXX").string()) {
+      if (mkdtemp(&path[0]) == nullptr) std::abort();
+      setenv("TMPDIR", path.c_str(), 1);
+    }
+    ~Folder() { rmdir(path.c_str()); }
+    std::string path;
+  } folder;
+  return folder.path;
 }
 
 size_t SavedFiles() {

@@ -22,13 +22,11 @@ Json::Value Parse(const std::string& text) {
   return value;
 }
 
-// The certificates listed for `params` (JSON text); the error code when
-// the list failed.
+// The certificates listed for `params` (JSON text), or the error code.
 Json::Value List(const std::string& params = "{}") {
   const ORVA::APIResponse response = CallMethod(doCertificateList_v1, Parse(params)).response;
-  return response.outcome() == ORVA::APIResponse::Outcome::kSuccess
-             ? response.data()["certificates"]
-             : Json::Value(response.error_code());
+  return response.error_code() == 0 ? response.data()["certificates"]
+                                    : Json::Value(response.error_code());
 }
 
 }  // namespace

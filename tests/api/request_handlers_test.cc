@@ -1,5 +1,7 @@
-// The methods that make requests and certificates: what they leave in the
-// store, and the requests they refuse with the store left as it was.
+// The methods that make requests and certificates: what renew and CRT
+// create leave in the store, and the requests every method refuses with the
+// store left as it was. The fault tests prove that each method succeeds on a
+// full store and leaves it whole.
 
 #include <string>
 
@@ -8,7 +10,6 @@
 #include "api/certificate.h"
 #include "common/store_paths.h"
 #include "tests/support/certificates.h"
-#include "tests/support/inspect.h"
 #include "tests/support/method_calls.h"
 #include "tests/support/store_state.h"
 
@@ -20,32 +21,69 @@ bool Shows(const std::string& path, const std::string& text) {
   return PemText(path).find(text) != std::string::npos;
 }
 
-// Both subjects of CRT create, the same but for the common names.
-Json::Value BothSubjects() {
-  Json::Value params = SubjectParams();
-  const Json::Value ca = SubjectParams("ca_");
-  for (const std::string& name : ca.getMemberNames()) params[name] = ca[name];
-  params["ca_common_name"] = "Local Root";
-  return params;
-}
-
 }  // namespace
 
-// The key length comes as text; one that does not fit 32 bits is no size.
-TEST(CsrCreate, LeavesAPrivatePendingPairThatAFailureKeeps) {
+// A necessary parameter missing or not of its kind (5503), and everything a
+// method would refuse half-way or that no HTTPS could use, is refused
+// before the first write: the store stays as it was and nothing is
+// activated. CRT create checks the CA's key size before the CA's subject.
+TEST(Refusals, LeaveTheStoreAsItWasAndActivateNothing) {
   TempDeviceRoot root;
-  const ORVA::APIResponse response = CallCreateCsr();
-  ASSERT_EQ(Outcome::kSuccess, response.outcome()) << response.error_code();
-  EXPECT_EQ(Json::Value(Json::objectValue), response.data());
-  EXPECT_EQ(0700, FileMode(root.Path(kGenDir)));
-  EXPECT_EQ(0400, FileMode(root.Path(kGenKeyPath)));
-  EXPECT_TRUE(Shows(root.Path(kGenCsrPath), "Public-Key: (2048 bit)"));
-  const StoreState pending = ReadStore(root);
-  ExpectStoreWhole(root, {});
-  Json::Value params = SubjectParams();
-  params["key_length"] = "4294968320";  // 2^32 + 1024
-  EXPECT_EQ(5501, CallMethod(doCertificateCreateCSR_v1, params).response.error_code());
-  EXPECT_EQ(CertificateFiles(pending), CertificateFiles(ReadStore(root)));
+  ASSERT_NO_FATAL_FAILURE(InstallOldStore(root));
+  ASSERT_TRUE(MakeRequest(root.Path("/outside/laptop.key"), root.Path("/outside/laptop.csr"),
+                          "/CN=My Laptop"));
+  ASSERT_TRUE(MakeSignedCertificate(root.Path(kCaKeyPath), root.Path(kCaCrtPath),
+                                    root.Path("/outside/small.key"),
+                                    root.Path("/outside/small.crt"), "/CN=small.local", 1024));
+  root.WriteFile("/outside/certificate.pem", "-----BEGIN CERTIFICATE-----\n");
+  root.WriteScript("/usr/orva/etc/plugins/certificate/notify", "touch \"$ORVA_ROOT/activated\"");
+  const StoreState before = ReadStore(root);
+  std::string many_names;
+  for (int i = 0; i <= 100; ++i) many_names += "n" + std::to_string(i) + ".local;";
+  const auto crt = doCertificateCreateCRT_v1, sign = doCertificateSign_v1;
+  const auto import = doCertificateImport_v1;
+  const struct { MethodHandler method; std::string changes; int code; const char* logged; }
+  cases[] = {
+      {crt, R"({"email":null})", 5503, ""},
+      {crt, R"({"ca_department":null})", 5503, ""},
+      {doCertificateCreateCSR_v1, R"({"email":null})", 5503, ""},
+      {sign, R"({"csr":"l.csr","csr_tmp":"ROOT/outside/laptop.csr"})", 5503, ""},
+      {sign, R"({"days":"TW","csr":"l.csr","csr_tmp":"ROOT/outside/laptop.csr"})", 5503, ""},
+      {sign, R"({"days":"9","csr_tmp":"ROOT/outside/laptop.csr"})", 5503, ""},
+      {import, R"({"key_tmp":"ROOT/outside/server.key"})", 5503, ""},
+      {import, R"({"cert_tmp":"ROOT/outside/server.crt"})", 5503, ""},
+      {doCertificateExport_v1, "{}", 5503, ""},
+      {doCertificateList_v1, R"({"type":"server_cert","additional":"TW"})", 5503, ""},
+      {crt, R"({"ca_country":"TWN"})", 5503, ""},
+      {crt, R"({"ca_key_length":"0","ca_country":"TWN"})", 5501, ""},
+      {crt, R"({"country":""})", 5501, ""},
+      {crt, R"({"common_name":")" + std::string(65, 'a') + "\"}", 5501, ""},
+      {crt, R"({"organization":"Evil\nextensions = x"})", 5501, ""},
+      {crt, R"({"state":"a\tb"})", 5501, ""},
+      {crt, R"({"department":"a\u007f"})", 5501, ""},
+      {crt, R"({"alias":"nas.local,DNS:evil"})", 5501, ""},
+      {crt, R"({"alias":")" + many_names + "\"}", 5501, ""},
+      {crt, R"({"key_length":"1024"})", 5501,
+       "Key size 1024 refused: RSA keys have 2048 to 16384 bits"},
+      {crt, R"({"key_length":"16385"})", 5501, ""},
+      {crt, R"({"common_name":"My NAS"})", 5501,
+       "The certificate would name no host: no alias, and the common name is no host name"},
+      {doCertificateCreateCSR_v1, R"({"key_length":"4294969344"})", 5501, ""},  // 2^32 + 2048
+      {sign, R"({"days":"0","csr":"l.csr","csr_tmp":"ROOT/outside/laptop.csr"})", 5503, ""},
+      {sign, R"({"days":"9","csr":"c.pem","csr_tmp":"ROOT/outside/certificate.pem"})", 5519, ""},
+      {sign, R"({"days":"825","csr":"l.csr","csr_tmp":"ROOT/outside/laptop.csr"})", 5501,
+       "The certificate would name no host"},
+      {import, R"({"cert_tmp":"ROOT/outside/small.crt","key_tmp":"ROOT/outside/small.key"})", 5514,
+       "The key has 1024 bits: the device's HTTPS needs RSA keys of at least 2048 bits"},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.changes.substr(0, 80));
+    LogCapture log;
+    EXPECT_EQ(c.code, CallMethod(c.method, Params(root, c.changes)).response.error_code());
+    EXPECT_TRUE(log.Contains(c.logged)) << log.Text();
+    EXPECT_EQ(before, ReadStore(root));
+  }
+  EXPECT_FALSE(FileExists(root.Path("/activated")));
 }
 
 // An RSA key's size is kept, raised to the 2048 bits that HTTPS needs;
@@ -62,74 +100,26 @@ TEST(CsrRenew, RepeatsTheInstalledSubjectAndKeySize) {
     TempDeviceRoot root;
     ASSERT_TRUE(MakeSelfSignedCa(root.Path(kServerKeyPath), root.Path(kServerCrtPath), c.subject,
                                  c.bits, c.type));
-    ASSERT_EQ(Outcome::kSuccess, CallRenew().outcome());
+    ASSERT_EQ(Outcome::kSuccess, CallMethod(doCertificateRenew_v1).response.outcome());
     EXPECT_TRUE(Shows(root.Path(kGenCsrPath), std::string("Subject: ") + c.shown + "\n"))
         << PemText(root.Path(kGenCsrPath));
     EXPECT_TRUE(Shows(root.Path(kGenCsrPath), std::string("Public-Key: ") + c.renewed));
+    EXPECT_EQ(0700, FileMode(root.Path(kGenDir))) << "the pending key's folder is private";
     ExpectStoreWhole(root, {});
   }
 }
 
-// Zero days are refused before the file is read.
-TEST(CsrSign, SignsAnUploadedRequestWithTheLocalCaAndRefusesWhatItCannotSign) {
-  TempDeviceRoot root;
-  const std::string csr = root.Path("/up/client.csr");
-  ASSERT_TRUE(MakeRequest(root.Path("/up/client.key"), csr, "/CN=client"));
-  root.WriteFile("/up/certificate.pem", "-----BEGIN CERTIFICATE-----\n");
-  Json::Value zero_days(Json::objectValue);
-  zero_days["csr"] = "client.csr";
-  zero_days["csr_tmp"] = root.Path("/missing.csr");
-  zero_days["days"] = "0";
-  EXPECT_EQ(5503, CallMethod(doCertificateSign_v1, zero_days).response.error_code());
-  EXPECT_EQ(5519, CallSign(root.Path("/up/certificate.pem")).error_code());
-  EXPECT_EQ(5501, CallSign(csr).error_code()) << "there is no local CA yet";
-  EXPECT_FALSE(FileExists(root.Path(kGenCrtPath)));
-  ASSERT_TRUE(MakeSelfSignedCa(root.Path(kCaKeyPath), root.Path(kCaCrtPath), "/CN=Root"));
-  const ORVA::APIResponse response = CallSign(csr);
-  ASSERT_EQ(Outcome::kSuccess, response.outcome()) << response.error_code();
-  EXPECT_EQ(Json::Value(Json::objectValue), response.data());
-  EXPECT_TRUE(RunForTest("openssl verify -CAfile '" + root.Path(kCaCrtPath) + "' '" +
-                         root.Path(kGenCrtPath) + "'"));
-  EXPECT_TRUE(FileExists(csr)) << "the upload is not touched";
-}
-
-// Refused subjects and names change nothing and activate nothing. The new
-// CA's subject comes from the "ca_" parameters; the server key has 2048
-// bits unless asked otherwise; the pending request pair stays.
-TEST(CrtCreate, RefusesBadSubjectsAndNamesOrInstallsAVerifiableSetAndActivatesIt) {
+// The new CA's subject comes from the "ca_" parameters; the server key has
+// 2048 bits unless asked otherwise; the old intermediate no longer fits and
+// goes; the pending request pair stays.
+TEST(CrtCreate, InstallsAVerifiableSetAndActivatesIt) {
   TempDeviceRoot root;
   ASSERT_NO_FATAL_FAILURE(InstallOldStore(root));
   const StoreState before = ReadStore(root);
-  for (const char* service : {"ftpd-ssl", "webdav-httpd-ssl"}) {
-    root.WriteScript(std::string("/usr/orva/etc/services/") + service,
-                     std::string("echo ") + service + " >> \"$ORVA_ROOT/ran\"");
-  }
-  std::string many_names;
-  for (int i = 0; i <= 100; ++i) many_names += "n" + std::to_string(i) + ".local;";
-  const std::string long_name(65, 'a');
-  // Everything the tool would refuse is refused first, in the steps' order:
-  // the CA's key size before the CA's subject.
-  const struct { const char *field, *value, *also; int code; } refused[] = {
-      {"ca_country", "TWN", "", 5503},
-      {"ca_key_length", "0", "ca_country", 5501},
-      {"country", "T", "", 5501},
-      {"common_name", long_name.c_str(), "", 5501},
-      {"organization", "Evil\nextensions = x", "", 5501},
-      {"alias", "nas.local,DNS:evil", "", 5501},
-      {"alias", many_names.c_str(), "", 5501},
-  };
-  for (const auto& c : refused) {
-    SCOPED_TRACE(std::string(c.field) + "=" + std::string(c.value).substr(0, 40));
-    Json::Value params = BothSubjects();
-    params[c.field] = c.value;
-    if (*c.also != '\0') params[c.also] = "TWN";
-    EXPECT_EQ(c.code, CallMethod(doCertificateCreateCRT_v1, params).response.error_code());
-    EXPECT_EQ(CertificateFiles(before), CertificateFiles(ReadStore(root)));
-    EXPECT_FALSE(FileExists(root.Path("/ran")));
-  }
-  Json::Value params = BothSubjects();
-  params["ca_key_length"] = 3072;
-  ASSERT_EQ(Outcome::kSuccess, CallMethod(doCertificateCreateCRT_v1, params).response.outcome());
+  root.WriteScript("/usr/orva/etc/plugins/certificate/notify", "touch \"$ORVA_ROOT/activated\"");
+  ASSERT_EQ(Outcome::kSuccess,
+            CallMethod(doCertificateCreateCRT_v1, Params(root, R"({"ca_key_length":3072})"))
+                .response.outcome());
   EXPECT_TRUE(RunForTest("openssl verify -CAfile '" + root.Path(kCaCrtPath) + "' '" +
                          root.Path(kServerCrtPath) + "'"));
   EXPECT_TRUE(Shows(root.Path(kServerCrtPath),
@@ -138,8 +128,8 @@ TEST(CrtCreate, RefusesBadSubjectsAndNamesOrInstallsAVerifiableSetAndActivatesIt
       << PemText(root.Path(kServerCrtPath));
   EXPECT_TRUE(Shows(root.Path(kServerCrtPath), "Public-Key: (2048 bit)"));
   EXPECT_TRUE(Shows(root.Path(kCaCrtPath), "Public-Key: (3072 bit)"));
-  EXPECT_FALSE(FileExists(root.Path(kInterCrtPath))) << "the old chain no longer fits";
-  EXPECT_EQ("ftpd-ssl\nwebdav-httpd-ssl\n", ReadFile(root.Path("/ran")));
+  EXPECT_FALSE(FileExists(root.Path(kInterCrtPath)));
+  EXPECT_TRUE(FileExists(root.Path("/activated")));
   EXPECT_EQ(before.at(".gen/server.csr").content, ReadFile(root.Path(kGenCsrPath)));
   ExpectStoreWhole(root, before);
 }

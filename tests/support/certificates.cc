@@ -1,8 +1,11 @@
 #include "tests/support/certificates.h"
 
+#include <openssl/pem.h>
+
 #include <cstdio>
 #include <cstdlib>
 
+#include "common/raii.h"
 #include "tests/support/test_support.h"
 
 namespace {
@@ -49,15 +52,15 @@ bool MakeSelfSignedCa(const std::string& keyPath, const std::string& certPath,
 }
 
 bool MakeRequest(const std::string& keyPath, const std::string& csrPath,
-                 const std::string& subject, int bits) {
-  return NewKeyRequest(keyPath, csrPath, bits, KeyType::kRsa, "-subj " + Quote(subject));
+                 const std::string& subject) {
+  return NewKeyRequest(keyPath, csrPath, 2048, KeyType::kRsa, "-subj " + Quote(subject));
 }
 
 bool MakeSignedCertificate(const std::string& caKeyPath, const std::string& caCertPath,
                            const std::string& keyPath, const std::string& certPath,
-                           const std::string& subject, int bits, KeyType type) {
+                           const std::string& subject, int bits) {
   const std::string csr = certPath + ".csr";
-  bool made = NewKeyRequest(keyPath, csr, bits, type, "-subj " + Quote(subject)) &&
+  bool made = NewKeyRequest(keyPath, csr, bits, KeyType::kRsa, "-subj " + Quote(subject)) &&
               RunForTest("openssl x509 -req -in " + Quote(csr) + " -CA " + Quote(caCertPath) +
                          " -CAkey " + Quote(caKeyPath) + " -set_serial 7 -days 200 -out " +
                          Quote(certPath));
@@ -65,11 +68,20 @@ bool MakeSignedCertificate(const std::string& caKeyPath, const std::string& caCe
   return made;
 }
 
-bool MakeChain(const std::string& folder, const std::string& subject, int bits) {
-  const std::string at = folder + "/";
-  return MakeSelfSignedCa(at + "root.key", at + "root.crt", "/CN=Root", bits) &&
-         MakeSignedCertificate(at + "root.key", at + "root.crt", at + "inter.key",
-                               at + "inter.crt", "/CN=Intermediate", bits) &&
-         MakeSignedCertificate(at + "inter.key", at + "inter.crt", at + "server.key",
-                               at + "server.crt", subject, bits);
+std::string PemText(const std::string& path) {
+  BioPtr text(BIO_new(BIO_s_mem()));
+  FilePtr file(std::fopen(path.c_str(), "r"));
+  if (!file || !text) return "";
+  X509Ptr certificate(PEM_read_X509(file.get(), nullptr, nullptr, nullptr));
+  if (certificate) {
+    X509_print(text.get(), certificate.get());
+  } else {
+    std::rewind(file.get());
+    X509_REQ* request = PEM_read_X509_REQ(file.get(), nullptr, nullptr, nullptr);
+    if (request != nullptr) X509_REQ_print(text.get(), request);
+    X509_REQ_free(request);
+  }
+  char* data = nullptr;
+  long size = BIO_get_mem_data(text.get(), &data);
+  return std::string(data, static_cast<size_t>(size));
 }

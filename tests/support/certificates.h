@@ -4,9 +4,9 @@
 #include <string>
 
 // PEM fixtures made with the machine's openssl tool, the one place tests
-// make them. Paths are real paths (under a device root); missing folders are
-// made. Each returns true on success. Keys are written as the tool writes
-// them ("BEGIN PRIVATE KEY"): RSA or DSA of `bits`, or EC on P-256.
+// make them, at real paths whose folders are made. Each returns true on
+// success. Keys are written as the tool writes them ("BEGIN PRIVATE KEY"):
+// RSA or DSA of `bits`, or EC on P-256.
 
 enum class KeyType { kRsa, kEc, kDsa };
 
@@ -15,20 +15,19 @@ bool MakeSelfSignedCa(const std::string& keyPath, const std::string& certPath,
                       const std::string& subject, int bits = 2048,
                       KeyType type = KeyType::kRsa);
 
-// A new key and a certificate for `subject` signed by the CA.
+// A new RSA key and a certificate for `subject` signed by the CA.
 bool MakeSignedCertificate(const std::string& caKeyPath, const std::string& caCertPath,
                            const std::string& keyPath, const std::string& certPath,
-                           const std::string& subject, int bits = 2048,
-                           KeyType type = KeyType::kRsa);
+                           const std::string& subject, int bits = 2048);
 
-// A new RSA key and a certificate signing request for `subject`.
+// A new RSA key of 2048 bits and a certificate signing request for `subject`.
 bool MakeRequest(const std::string& keyPath, const std::string& csrPath,
-                 const std::string& subject, int bits = 2048);
+                 const std::string& subject);
 
-// An issuing chain of RSA keys of `bits` in `folder`: root.key, root.crt
-// ("/CN=Root"); inter.key, inter.crt ("/CN=Intermediate", by the root);
-// server.key, server.crt (`subject`, by the intermediate).
-bool MakeChain(const std::string& folder, const std::string& subject, int bits = 2048);
+// The first certificate, or else the first certificate signing request, of
+// the PEM file at `path` as the OpenSSL library prints it ("Subject: C=TW,
+// O=...", "Public-Key: (2048 bit)", alternative names); "" for neither.
+std::string PemText(const std::string& path);
 
 // Runs a shell command line for test set-up, without input or output;
 // true when it exited with 0.

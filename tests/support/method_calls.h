@@ -8,6 +8,7 @@
 #include "platform/webapi/api_download.h"
 #include "platform/webapi/api_request.h"
 #include "platform/webapi/api_response.h"
+#include "tests/support/test_support.h"
 
 // The certificate module's methods called in-process, as the host calls
 // them: one request, one answer, and the download the handler handed out.
@@ -27,17 +28,9 @@ MethodAnswer CallMethod(MethodHandler handler,
 // `prefix` ("" or "ca_"), for the create methods.
 Json::Value SubjectParams(const std::string& prefix = "");
 
-// The methods with complete, valid parameters and keys of the smallest
-// size the device makes (2048 bits).
-ORVA::APIResponse CallCreateCsr();
-ORVA::APIResponse CallRenew();
-// Signs the request file at the real path `csrPath` for 30 days.
-ORVA::APIResponse CallSign(const std::string& csrPath);
-ORVA::APIResponse CallCreateCrt();
-// Imports the uploads at the real paths given, as the host hands them over.
-ORVA::APIResponse CallImport(const std::string& certPath, const std::string& keyPath,
-                             const std::string& interPath);
-// Exports `set` ("archive", "csr_set", "signed_set").
-MethodAnswer CallExport(const std::string& set);
+// Both subjects of CRT create (the CA's common name "Local Root"), which
+// the other methods ignore, changed by the JSON object `changes`: a null
+// value removes the parameter, and "ROOT" stands for the device root.
+Json::Value Params(const TempDeviceRoot& root, std::string changes = "{}");
 
 #endif  // ORVA_TESTS_SUPPORT_METHOD_CALLS_H_

@@ -13,6 +13,7 @@
 
 #include "common/pem_password.h"
 #include "common/raii.h"
+#include "common/store_paths.h"
 #include "tests/support/certificates.h"
 
 namespace fs = std::filesystem;
@@ -66,7 +67,8 @@ bool IsWholeFileOfItsKind(const std::string& name, const std::string& content) {
   }
   if (name == ".mkcert.serial") {
     const std::string digits = content.substr(0, content.find_last_not_of('\n') + 1);
-    return !digits.empty() && digits.find_first_not_of("0123456789ABCDEFabcdef") == std::string::npos;
+    return !digits.empty() &&
+           digits.find_first_not_of("0123456789ABCDEFabcdef") == std::string::npos;
   }
   if (name.rfind("cfg.d/", 0) == 0) return !content.empty() && content.back() == '\n';
   return name == ".gen/archive.zip" && content.rfind("PK", 0) == 0;
@@ -110,32 +112,26 @@ void RestoreStore(const TempDeviceRoot& root, const StoreState& state) {
 }
 
 void InstallOldStore(const TempDeviceRoot& root) {
-  const std::string ssl = root.Path(kStore);
-  ASSERT_TRUE(MakeSelfSignedCa(ssl + "/ssl.key/ca.key", ssl + "/ssl.crt/ca.crt",
-                               "/CN=Old Root"));
-  MakeDirs(ssl + "/ssl.csr");
-  ASSERT_TRUE(RunForTest("openssl req -new -key '" + ssl + "/ssl.key/ca.key' -subj '/CN=Old Root' -out '" +
-                         ssl + "/ssl.csr/ca.csr'"));
-  ASSERT_TRUE(MakeSignedCertificate(ssl + "/ssl.key/ca.key", ssl + "/ssl.crt/ca.crt",
-                                    ssl + "/ssl.key/server.key", ssl + "/ssl.crt/server.crt",
-                                    "/C=TW/O=Old Works/CN=old.local"));
-  const std::string caCertificate = ReadFile(ssl + "/ssl.crt/ca.crt");
-  root.WriteFile(std::string(kStore) + "/ssl.intercrt/server-ca.crt", caCertificate);
-  ASSERT_TRUE(MakeRequest(ssl + "/.gen/server.key", ssl + "/.gen/server.csr",
-                          "/CN=pending.local"));
-  root.WriteFile(std::string(kStore) + "/.gen/server.crt",
-                 ReadFile(ssl + "/ssl.crt/server.crt"), 0400);
-  root.WriteFile(std::string(kStore) + "/.mkcert.serial", "5F3A11");
-  root.WriteFile(std::string(kStore) + "/cfg.d/ca.cfg", "[ req ]\n");
-  for (const char* key : {"/ssl.key/ca.key", "/ssl.key/server.key", "/.gen/server.key"}) {
-    chmod((ssl + key).c_str(), 0400);
+  const std::string caKey = root.Path(kCaKeyPath), caCrt = root.Path(kCaCrtPath);
+  ASSERT_TRUE(MakeSelfSignedCa(caKey, caCrt, "/CN=Old Root"));
+  MakeDirs(root.Path(kStore) + "/ssl.csr");
+  ASSERT_TRUE(RunForTest("openssl req -new -key '" + caKey + "' -subj '/CN=Old Root' -out '" +
+                         root.Path(kCaCsrPath) + "'"));
+  ASSERT_TRUE(MakeSignedCertificate(caKey, caCrt, root.Path(kServerKeyPath),
+                                    root.Path(kServerCrtPath), "/C=TW/O=Old Works/CN=old.local"));
+  root.WriteFile(kInterCrtPath, ReadFile(caCrt));
+  ASSERT_TRUE(MakeRequest(root.Path(kGenKeyPath), root.Path(kGenCsrPath), "/CN=pending.local"));
+  root.WriteFile(kGenCrtPath, ReadFile(root.Path(kServerCrtPath)), 0400);
+  root.WriteFile(kSerialPath, "5F3A11");
+  root.WriteFile(kCaCfgPath, "[ req ]\n");
+  for (const char* key : {kCaKeyPath, kServerKeyPath, kGenKeyPath}) {
+    chmod(root.Path(key).c_str(), 0400);
   }
   ASSERT_TRUE(MakeRequest(root.Path("/outside/request.key"), root.Path("/outside/request.csr"),
                           "/CN=client.local"));
-  ASSERT_TRUE(MakeSignedCertificate(ssl + "/ssl.key/ca.key", ssl + "/ssl.crt/ca.crt",
-                                    root.Path("/outside/server.key"),
+  ASSERT_TRUE(MakeSignedCertificate(caKey, caCrt, root.Path("/outside/server.key"),
                                     root.Path("/outside/server.crt"), "/CN=imported.local"));
-  root.WriteFile("/outside/server-ca.crt", caCertificate);
+  root.WriteFile("/outside/server-ca.crt", ReadFile(caCrt));
 }
 
 void ExpectStoreWhole(const TempDeviceRoot& root, const StoreState& before) {

@@ -9,7 +9,6 @@
 
 #include "common/store_paths.h"
 #include "tests/support/certificates.h"
-#include "tests/support/inspect.h"
 #include "tests/support/store_state.h"
 #include "toolkit/mkcert.h"
 

@@ -8,6 +8,7 @@
 
 #include <gtest/gtest.h>
 
+#include "api/certificate.h"
 #include "common/store_paths.h"
 #include "tests/support/certificates.h"
 #include "tests/support/method_calls.h"
@@ -22,7 +23,8 @@ std::string ExportedMembers(const TempDeviceRoot& root, const std::string& set) 
   struct stat archive;
   const bool kept = stat(root.Path(kArchivePath).c_str(), &archive) == 0 && S_ISREG(archive.st_mode);
   const std::string last = kept ? ReadFile(root.Path(kArchivePath)) : "";
-  const MethodAnswer answer = CallExport(set);
+  const MethodAnswer answer =
+      CallMethod(doCertificateExport_v1, Params(root, R"({"file":")" + set + "\"}"));
   EXPECT_EQ(ORVA::APIResponse::Outcome::kNone, answer.response.outcome());
   EXPECT_EQ(!answer.download.has_body, answer.response.output_enabled());
   if (!answer.download.has_body) {

@@ -1,15 +1,13 @@
 // The import of an uploaded certificate set: what it installs, and the
 // uploads it refuses with the store and the services left as they were.
 
-#include <openssl/core_names.h>
-#include <openssl/param_build.h>
+#include <openssl/params.h>
 #include <openssl/pem.h>
 #include <time.h>
 
 #include <map>
 #include <optional>
 #include <string>
-#include <vector>
 
 #include <gtest/gtest.h>
 
@@ -25,32 +23,25 @@ namespace {
 // Writes the RSA key of `from` to `to` with a private exponent that no
 // longer fits its public part: the modulus still matches the certificate.
 bool WriteKeyWithWrongPrivatePart(const std::string& from, const std::string& to) {
-  FilePtr in(std::fopen(from.c_str(), "r"));
+  FilePtr in(std::fopen(from.c_str(), "r")), out(std::fopen(to.c_str(), "w"));
   EvpPkeyPtr key(in ? PEM_read_PrivateKey(in.get(), nullptr, nullptr, nullptr) : nullptr);
-  const char* names[] = {"n", "e", "d", "rsa-factor1", "rsa-factor2", "rsa-exponent1",
-                         "rsa-exponent2", "rsa-coefficient1"};
-  std::unique_ptr<OSSL_PARAM_BLD, decltype(&OSSL_PARAM_BLD_free)> build(OSSL_PARAM_BLD_new(),
-                                                                         OSSL_PARAM_BLD_free);
-  std::vector<std::unique_ptr<BIGNUM, decltype(&BN_free)>> numbers;
-  for (const char* name : names) {
-    BIGNUM* number = nullptr;
-    if (!key || EVP_PKEY_get_bn_param(key.get(), name, &number) != 1) return false;
-    numbers.emplace_back(number, BN_free);
-    if (std::string(name) == "d") BN_add_word(number, 2);
-    OSSL_PARAM_BLD_push_BN(build.get(), name, number);
-  }
-  std::unique_ptr<OSSL_PARAM, decltype(&OSSL_PARAM_free)> params(
-      OSSL_PARAM_BLD_to_param(build.get()), OSSL_PARAM_free);
-  std::unique_ptr<EVP_PKEY_CTX, decltype(&EVP_PKEY_CTX_free)> context(
-      EVP_PKEY_CTX_new_from_name(nullptr, "RSA", nullptr), EVP_PKEY_CTX_free);
+  OSSL_PARAM* params = nullptr;
+  BIGNUM* d = nullptr;
   EVP_PKEY* wrong = nullptr;
-  if (EVP_PKEY_fromdata_init(context.get()) != 1 ||
-      EVP_PKEY_fromdata(context.get(), &wrong, EVP_PKEY_KEYPAIR, params.get()) != 1) {
-    return false;
-  }
-  EvpPkeyPtr owner(wrong);
-  FilePtr out(std::fopen(to.c_str(), "w"));
-  return out && PEM_write_PrivateKey(out.get(), wrong, nullptr, nullptr, 0, nullptr, nullptr) == 1;
+  EVP_PKEY_CTX* context = EVP_PKEY_CTX_new_from_name(nullptr, "RSA", nullptr);
+  OSSL_PARAM* exponent = nullptr;
+  const bool written =
+      key && out && EVP_PKEY_todata(key.get(), EVP_PKEY_KEYPAIR, &params) == 1 &&
+      (exponent = OSSL_PARAM_locate(params, "d")) != nullptr &&
+      OSSL_PARAM_get_BN(exponent, &d) == 1 && BN_add_word(d, 2) == 1 &&
+      OSSL_PARAM_set_BN(exponent, d) == 1 && EVP_PKEY_fromdata_init(context) == 1 &&
+      EVP_PKEY_fromdata(context, &wrong, EVP_PKEY_KEYPAIR, params) == 1 &&
+      PEM_write_PrivateKey(out.get(), wrong, nullptr, nullptr, 0, nullptr, nullptr) == 1;
+  EVP_PKEY_free(wrong);
+  EVP_PKEY_CTX_free(context);
+  BN_free(d);
+  OSSL_PARAM_free(params);
+  return written;
 }
 
 // A store with an old set, and uploads beside InstallOldStore's outside
