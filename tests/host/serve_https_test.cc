@@ -40,7 +40,11 @@ TEST_F(ServeTest, HttpsTakesEachStorePairThatLoadsWhileHostileClientsHoldTheDoor
   };
   ASSERT_TRUE(install_self_signed("factory.local", 2048));
   const std::string work = scratch_.Path("/outside/");
-  ASSERT_TRUE(MakeChain(work, "/CN=imported.example", 2048));
+  ASSERT_TRUE(MakeSelfSignedCa(work + "root.key", work + "root.crt", "/CN=Root"));
+  ASSERT_TRUE(MakeSignedCertificate(work + "root.key", work + "root.crt", work + "inter.key",
+                                    work + "inter.crt", "/CN=Intermediate"));
+  ASSERT_TRUE(MakeSignedCertificate(work + "inter.key", work + "inter.crt", work + "server.key",
+                                    work + "server.crt", "/CN=imported.example"));
   ServeProcess server(scratch_.root());
   const int port = server.https_port();
   ASSERT_GT(port, 0) << server.Output() << server.Log();
