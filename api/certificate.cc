@@ -86,7 +86,8 @@ void doCertificateCreateCSR_v1(ORVA::APIRequest* request,
              {"organization", kParameterText, true},
              {"department", kParameterText, true},
              {"common_name", kParameterText, true},
-             {"email", kParameterText, true}},
+             {"email", kParameterText, true},
+             {"key_type", kParameterText, false}},
             handleCSRAction);
 }
 
@@ -121,6 +122,8 @@ void doCertificateCreateCRT_v1(ORVA::APIRequest* request,
              {"organization", kParameterText, true},
              {"department", kParameterText, true},
              {"common_name", kParameterText, true},
-             {"email", kParameterText, true}},
+             {"email", kParameterText, true},
+             {"key_type", kParameterText, false},
+             {"ca_key_type", kParameterText, false}},
             handleCRTAction);
 }

@@ -55,7 +55,7 @@ TEST(CsrRenew, RepeatsTheInstalledSubjectAndKeySize) {
   cases[] = {
       {"/C=DE/O=Org/CN=nas.local", "C=DE, O=Org, CN=nas.local", 2304, KeyType::kRsa, "(2304 bit)"},
       {"/C=TW/CN=small.local", "C=TW, CN=small.local", 1024, KeyType::kRsa, "(2048 bit)"},
-      {"/C=TW/CN=ec.local", "C=TW, CN=ec.local", 0, KeyType::kEc, "(2048 bit)"},
+      {"/C=TW/CN=ec.local", "C=TW, CN=ec.local", 0, KeyType::kEc, "(256 bit)"},
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(c.subject);
