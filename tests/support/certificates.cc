@@ -73,25 +73,3 @@ bool MakeChain(const std::string& folder, const std::string& subject, int bits) 
          MakeSignedCertificate(at + "inter.key", at + "inter.crt", at + "server.key",
                                at + "server.crt", subject, bits);
 }
-
-bool MakeVerifiableChain(const std::string& folder, const std::string& subject) {
-  const std::string at = folder + "/";
-  const std::string ca =
-      " -addext basicConstraints=critical,CA:true -addext keyUsage=critical,keyCertSign";
-  auto signed_by = [&at](const std::string& issuer, const std::string& name,
-                         const std::string& options) {
-    const std::string csr = at + name + ".csr";
-    bool made = NewKeyRequest(at + name + ".key", csr, 0, KeyType::kEc, options) &&
-                RunForTest("openssl x509 -req -copy_extensions copyall -in " + Quote(csr) +
-                           " -CA " + Quote(at + issuer + ".crt") + " -CAkey " +
-                           Quote(at + issuer + ".key") + " -set_serial 9 -days 200 -out " +
-                           Quote(at + name + ".crt"));
-    std::remove(csr.c_str());
-    return made;
-  };
-  return NewKeyRequest(at + "root.key", at + "root.crt", 0, KeyType::kEc,
-                       "-x509 -days 365 -subj /CN=Root" + ca) &&
-         signed_by("root", "inter", "-subj /CN=Intermediate" + ca) &&
-         signed_by("inter", "server",
-                   "-subj " + Quote(subject) + " -addext extendedKeyUsage=serverAuth");
-}

@@ -30,12 +30,6 @@ bool MakeRequest(const std::string& keyPath, const std::string& csrPath,
 // server.key, server.crt (`subject`, by the intermediate).
 bool MakeChain(const std::string& folder, const std::string& subject, int bits = 2048);
 
-// An issuing chain that strict verifiers accept, of EC keys on P-256, in
-// `folder`: root.key, root.crt ("/CN=Root", a CA); inter.key, inter.crt
-// ("/CN=Intermediate", a CA, by the root); server.key, server.crt
-// (`subject`, for serverAuth, by the intermediate).
-bool MakeVerifiableChain(const std::string& folder, const std::string& subject);
-
 // Runs a shell command line for test set-up, without input or output;
 // true when it exited with 0.
 bool RunForTest(const std::string& commandLine);
