@@ -6,6 +6,7 @@
 #include <openssl/crypto.h>
 #include <openssl/evp.h>
 #include <openssl/pkcs12.h>
+#include <openssl/provider.h>
 #include <openssl/x509.h>
 #include <openssl/x509v3.h>
 
@@ -65,11 +66,17 @@ struct Pkcs12Deleter {
 };
 using Pkcs12Ptr = std::unique_ptr<PKCS12, Pkcs12Deleter>;
 
-// A library context frees the providers loaded into it.
+// A provider loaded into a library context must be unloaded before the
+// context is freed.
 struct LibraryContextDeleter {
   void operator()(OSSL_LIB_CTX* context) const { OSSL_LIB_CTX_free(context); }
 };
 using LibraryContextPtr = std::unique_ptr<OSSL_LIB_CTX, LibraryContextDeleter>;
+
+struct ProviderUnloader {
+  void operator()(OSSL_PROVIDER* provider) const { OSSL_PROVIDER_unload(provider); }
+};
+using ProviderPtr = std::unique_ptr<OSSL_PROVIDER, ProviderUnloader>;
 
 // Memory the library allocated (OPENSSL_malloc) for the caller.
 struct OpensslFree {

@@ -1,6 +1,7 @@
 #include <openssl/err.h>
 #include <openssl/pem.h>
 #include <openssl/pkcs12.h>
+#include <unistd.h>
 
 #include <cstdio>
 #include <string>
@@ -45,8 +46,10 @@ bool ReadInstalledSet(InstalledSet* set) {
     return false;
   }
   set->certificate = std::move(certificates.front());
-  // Ignoring the result: without an intermediate file the chain is empty.
-  loadCrtList(OrvaPath(kInterCrtPath).c_str(), set->chain);
+  // Without an intermediate file the chain is empty; an unreadable one is
+  // logged by the reader and sent as an empty chain.
+  const std::string chain = OrvaPath(kInterCrtPath);
+  if (access(chain.c_str(), F_OK) == 0) loadCrtList(chain.c_str(), set->chain);
   ERR_clear_error();
   return true;
 }

@@ -25,16 +25,23 @@ struct LooseBundle {
 
 // A library context with the algorithms of older PKCS#12 files (RC2, 3DES)
 // beside the default ones, for one call: loading them into the process's
-// own context would offer them to every TLS handshake too. Null when the
-// providers cannot be loaded.
-LibraryContextPtr BundleLibrary() {
-  LibraryContextPtr library(OSSL_LIB_CTX_new());
-  if (library && (OSSL_PROVIDER_load(library.get(), "default") == nullptr ||
-                  OSSL_PROVIDER_load(library.get(), "legacy") == nullptr)) {
-    library.reset();
+// own context would offer them to every TLS handshake too.
+class BundleLibrary {
+ public:
+  BundleLibrary() : context_(OSSL_LIB_CTX_new()) {
+    if (!context_) return;
+    default_.reset(OSSL_PROVIDER_load(context_.get(), "default"));
+    legacy_.reset(OSSL_PROVIDER_load(context_.get(), "legacy"));
   }
-  return library;
-}
+
+  // The context; null when it or a provider could not be made.
+  OSSL_LIB_CTX* get() const { return default_ && legacy_ ? context_.get() : nullptr; }
+
+ private:
+  LibraryContextPtr context_;  // declared first: freed after the providers
+  ProviderPtr default_;
+  ProviderPtr legacy_;
+};
 
 // Password callback handing out the std::string at `password`; an empty
 // password gives none, so an encrypted key fails to open.
@@ -223,8 +230,8 @@ int SortOut(LooseBundle* bundle, BundleParts* parts) {
 
 int ReadBundle(const std::string& content, const std::string& password, BundleParts* parts) {
   // Declared first, so every key and certificate made in it goes before it.
-  LibraryContextPtr library = BundleLibrary();
-  if (!library) {
+  BundleLibrary library;
+  if (library.get() == nullptr) {
     ORVA_LOG("Load the PKCS#12 algorithms failed");
     return kErrFailed;
   }

@@ -13,9 +13,9 @@
 // checks (SSLCAFormHandler::checkCAContent), staged install (InstallUploads:
 // the chain becomes the intermediate file, and a bundle without one removes
 // the installed one) and activation as the import. Answers success with
-// {"restart_httpd": bool}, or with null data ReadBundle's code or the
-// import's (5514, 5515, 5517, 5518...), the store then as it was. The
-// upload is read, never changed.
+// {"restart_httpd": bool}, or with null data ReadBundle's code (5521 also
+// for an upload that cannot be read) or the import's (5514, 5515, 5517,
+// 5518...), the store then as it was. The upload is read, never changed.
 void ImportBundle(ORVA::APIRequest* request, ORVA::APIResponse* response);
 
 // Export of the installed server set. "format" "pkcs12": a PKCS#12 file of
