@@ -35,9 +35,9 @@ class ServerRequestFile {
 // Makes and installs the new CA and server pair. Returns kErrNone or the
 // code to answer with; every failure is logged.
 int CreateCertificateSet(ORVA::APIRequest* request) {
-  KeySpec server_key_spec, ca_key_spec;
-  if (!ReadKeySpec(request, "key_type", "key_length", &server_key_spec) ||
-      !ReadKeySpec(request, "ca_key_type", "ca_key_length", &ca_key_spec)) {
+  KeyKind server_key_kind, ca_key_kind;
+  if (!ReadKeyKind(request, "key_type", "key_length", &server_key_kind) ||
+      !ReadKeyKind(request, "ca_key_type", "ca_key_length", &ca_key_kind)) {
     return kErrBadParameter;
   }
   std::string aliases = request->GetParam("alias", "").asString();
@@ -52,7 +52,7 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
   // Everything the steps would refuse is refused before the first file is
   // written, in the order the steps would meet it: the CA's key size, the
   // CA's subject, the server's key size, its subject and the names.
-  if (checkKeySpec(ca_key_spec) != 0) {
+  if (checkKeyKind(ca_key_kind) != 0) {
     ORVA_LOG("Generate CA key & crt failed");
     return kErrFailed;
   }
@@ -60,7 +60,7 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
     ORVA_LOG("Generate CA key & crt failed");
     return kErrBadParameter;
   }
-  if (checkKeySpec(server_key_spec) != 0) {
+  if (checkKeyKind(server_key_kind) != 0) {
     ORVA_LOG("Generate server key failed");
     return kErrFailed;
   }
@@ -78,7 +78,7 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
   // the way leaves the running CA, key and certificate together.
   StoreFileSet set;
   std::string ca_key, ca_crt;
-  int made = genCASetInto(&set, &ca_record, ca_key_spec, &ca_key, &ca_crt);
+  int made = genCASetInto(&set, &ca_record, ca_key_kind, &ca_key, &ca_crt);
   if (made != 0) {
     ORVA_LOG("Generate CA key & crt failed");
     return made == -2 ? kErrBadParameter : kErrFailed;
@@ -87,7 +87,7 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
       set.Add(OrvaPath(kServerKeyPath), StoreContent::kPrivateKey);
   const std::string server_crt =
       set.Add(OrvaPath(kServerCrtPath), StoreContent::kCertificate);
-  if (genKeyOf(server_key.c_str(), server_key_spec) == -1) {
+  if (genKeyOf(server_key.c_str(), server_key_kind) == -1) {
     ORVA_LOG("Generate server key failed");
     return kErrFailed;
   }

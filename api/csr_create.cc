@@ -12,12 +12,12 @@ void handleCSRAction(ORVA::APIRequest* request, ORVA::APIResponse* response) {
     response->SetError(kErrFailed, Json::Value());
     return;
   }
-  KeySpec spec;
-  if (!ReadKeySpec(request, "key_type", "key_length", &spec)) {
+  KeyKind kind;
+  if (!ReadKeyKind(request, "key_type", "key_length", &kind)) {
     response->SetError(kErrBadParameter, Json::Value());
     return;
   }
-  if (generateCSR(spec, record) == 0) {
+  if (generateCSR(kind, record) == 0) {
     ORVA_LOG_LASTERR("Generate csr from csr action failed");
     response->SetError(kErrFailed, Json::Value());
     return;

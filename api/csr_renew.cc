@@ -58,7 +58,7 @@ void FillFromSubject(const Json::Value& subject, CSR_ARGUMENT* record) {
 // size keys are made with, EC on P-384 for a curve of 384 bits or more and
 // P-256 below, and RSA of 2048 bits for any other type. Returns false
 // (logged) when it cannot be read.
-bool InstalledKeySpec(KeySpec* spec) {
+bool InstalledKeyKind(KeyKind* kind) {
   FilePtr file(std::fopen(OrvaPath(kServerCrtPath).c_str(), "r"));
   if (!file) {
     ORVA_LOG_LASTERR("open %s failed ", kServerCrtPath);
@@ -77,13 +77,13 @@ bool InstalledKeySpec(KeySpec* spec) {
   const int bits = EVP_PKEY_get_bits(key.get());
   switch (EVP_PKEY_base_id(key.get())) {
     case EVP_PKEY_RSA:
-      *spec = {KeyAlgorithm::kRsa, std::max(bits, kMinRsaKeyBits)};
+      *kind = {KeyAlgorithm::kRsa, std::max(bits, kMinRsaKeyBits)};
       break;
     case EVP_PKEY_EC:
-      *spec = {KeyAlgorithm::kEc, bits >= 384 ? 384 : 256};
+      *kind = {KeyAlgorithm::kEc, bits >= 384 ? 384 : 256};
       break;
     default:
-      *spec = {KeyAlgorithm::kRsa, kDefaultKeyLength};
+      *kind = {KeyAlgorithm::kRsa, kDefaultKeyLength};
   }
   return true;
 }
@@ -99,13 +99,13 @@ void handleRenewAction(ORVA::APIRequest* request, ORVA::APIResponse* response) {
   }
   CSR_ARGUMENT record;
   FillFromSubject(ServerSubject(info), &record);
-  KeySpec spec;
-  if (!InstalledKeySpec(&spec)) {
+  KeyKind kind;
+  if (!InstalledKeyKind(&kind)) {
     ORVA_LOG_LASTERR("Getting key length from %s failed", kServerCrtPath);
     response->SetError(kErrFailed, Json::Value());
     return;
   }
-  if (generateCSR(spec, record) == 0) {
+  if (generateCSR(kind, record) == 0) {
     ORVA_LOG_LASTERR("Generate csr from renew action failed");
     response->SetError(kErrFailed, Json::Value());
     return;

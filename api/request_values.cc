@@ -20,13 +20,13 @@ int ReadKeyLength(ORVA::APIRequest* request, const char* name, const char* fallb
 
 }  // namespace
 
-bool ReadKeySpec(ORVA::APIRequest* request, const char* typeName, const char* lengthName,
-                 KeySpec* spec) {
+bool ReadKeyKind(ORVA::APIRequest* request, const char* typeName, const char* lengthName,
+                 KeyKind* kind) {
   const std::string type = request->GetParam(typeName, "rsa").asString();
   if (type == "rsa") {
-    *spec = {KeyAlgorithm::kRsa, ReadKeyLength(request, lengthName, "2048")};
+    *kind = {KeyAlgorithm::kRsa, ReadKeyLength(request, lengthName, "2048")};
   } else if (type == "ec") {
-    *spec = {KeyAlgorithm::kEc, ReadKeyLength(request, lengthName, "256")};
+    *kind = {KeyAlgorithm::kEc, ReadKeyLength(request, lengthName, "256")};
   } else {
     ORVA_LOG("Key type \"%s\" refused: keys are \"rsa\" or \"ec\"", type.c_str());
     return false;

@@ -9,7 +9,7 @@
 #include "platform/olib/olib_szlist.h"
 #include "platform/olib/olib_types.h"
 #include "toolkit/csr_argument.h"
-#include "toolkit/key_spec.h"
+#include "toolkit/key_kind.h"
 #include "toolkit/request_facts.h"
 #include "toolkit/store_file.h"
 
@@ -50,14 +50,14 @@ int genKey(const char* keyPath, unsigned int bits);
 // otherwise.
 int checkKeySize(unsigned int bits);
 
-// genKey for any spec: RSA keys as genKey makes them, EC keys on the named
-// curve of `spec` (written by the tool as "BEGIN PRIVATE KEY"). 0 on
-// success; -1 (logged) as genKey, or for a spec checkKeySpec refuses.
-int genKeyOf(const char* keyPath, const KeySpec& spec);
+// genKey for any kind: RSA keys as genKey makes them, EC keys on the named
+// curve of `kind` (written by the tool as "BEGIN PRIVATE KEY"). 0 on
+// success; -1 (logged) as genKey, or for a kind checkKeyKind refuses.
+int genKeyOf(const char* keyPath, const KeyKind& kind);
 
-// 0 for a spec genKeyOf makes: RSA sizes checkKeySize accepts, EC on P-256
-// or P-384; -1 (logged with the spec) otherwise.
-int checkKeySpec(const KeySpec& spec);
+// 0 for a kind genKeyOf makes: RSA sizes checkKeySize accepts, EC on P-256
+// or P-384; -1 (logged with the kind) otherwise.
+int checkKeyKind(const KeyKind& kind);
 
 // Writes the request configuration at `configPath` from `subject` and makes
 // a request for the existing key `keyPath` at `requestPath` (mode 0400).
@@ -179,13 +179,13 @@ int verifyCrtAndKeyOfAnyType(const char* certPath, const char* keyPath);
 // was (only its configuration and extension files are rewritten).
 int genCASet(CSR_ARGUMENT* subject, int bits);
 
-// Makes the local CA as genCASet does, with a key of `spec` (refused with
-// -1 by checkKeySpec), as members of `set`, which the
+// Makes the local CA as genCASet does, with a key of `kind` (refused with
+// -1 by checkKeyKind), as members of `set`, which the
 // caller installs with files that must go with it. Stores the temporary
 // paths of the new CA key and certificate in *key and *certificate (for
 // signing before the install). The results are genCASet's; nothing is
 // installed either way.
-int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, const KeySpec& spec,
+int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, const KeyKind& kind,
                  std::string* key, std::string* certificate);
 
 // Appends every certificate of the PEM file at `path` to `certificates`,

@@ -11,7 +11,7 @@ namespace {
 constexpr int kCaValidityDays = 3650;
 }  // namespace
 
-int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, const KeySpec& spec,
+int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, const KeyKind& kind,
                  std::string* key, std::string* certificate) {
   for (const char* path : {kCaCsrPath, kCaCrtPath, kCaKeyPath}) {
     if (genDir(OrvaPath(path).c_str()) != 0) {
@@ -23,7 +23,7 @@ int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, const KeySpec& spec,
   *certificate = set->Add(OrvaPath(kCaCrtPath), StoreContent::kCertificate);
   *key = set->Add(OrvaPath(kCaKeyPath), StoreContent::kPrivateKey);
 
-  int result = genKeyOf(key->c_str(), spec);
+  int result = genKeyOf(key->c_str(), kind);
   if (result != 0) {
     ORVA_LOG("genCAKey() failed");
     return result;
