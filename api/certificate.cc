@@ -1,39 +1,9 @@
 #include "api/certificate.h"
 
-#include <initializer_list>
-#include <utility>
-
-#include "common/api_errors.h"
-#include "platform/webapi/parameter_checker.h"
+#include "api/method_rules.h"
 #include "upload/sslca_form_handler.h"
 
 namespace {
-
-struct Rule {
-  const char* name;
-  ParameterType type;
-  bool necessary;
-};
-
-Json::Value BuildRules(std::initializer_list<Rule> rules) {
-  Json::Value set(Json::objectValue);
-  for (const Rule& rule : rules) {
-    set["field"][rule.name]["type"] = static_cast<int>(rule.type);
-    set["field"][rule.name]["necessary"] = rule.necessary;
-  }
-  return set;
-}
-
-// Runs `action` when the request passes `rules`; answers 5503 otherwise.
-template <typename Action>
-void CheckThen(ORVA::APIRequest* request, ORVA::APIResponse* response,
-               std::initializer_list<Rule> rules, Action&& action) {
-  if (!ParameterChecker::check(request, BuildRules(rules))) {
-    response->SetError(kErrBadParameter, Json::Value());
-    return;
-  }
-  action(request, response);
-}
 
 const ORVA::APIEntry gTable[kCertificateApiCount] = {
     {"ORVA.Core.Certificate", 1, "list", doCertificateList_v1},
@@ -86,7 +56,8 @@ void doCertificateCreateCSR_v1(ORVA::APIRequest* request,
              {"organization", kParameterText, true},
              {"department", kParameterText, true},
              {"common_name", kParameterText, true},
-             {"email", kParameterText, true}},
+             {"email", kParameterText, true},
+             {"key_type", kParameterText, false}},
             handleCSRAction);
 }
 
@@ -121,6 +92,8 @@ void doCertificateCreateCRT_v1(ORVA::APIRequest* request,
              {"organization", kParameterText, true},
              {"department", kParameterText, true},
              {"common_name", kParameterText, true},
-             {"email", kParameterText, true}},
+             {"email", kParameterText, true},
+             {"key_type", kParameterText, false},
+             {"ca_key_type", kParameterText, false}},
             handleCRTAction);
 }

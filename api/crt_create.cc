@@ -35,8 +35,11 @@ class ServerRequestFile {
 // Makes and installs the new CA and server pair. Returns kErrNone or the
 // code to answer with; every failure is logged.
 int CreateCertificateSet(ORVA::APIRequest* request) {
-  int key_length = ReadKeyLength(request, "key_length");
-  int ca_key_length = ReadKeyLength(request, "ca_key_length");
+  KeyKind server_key_kind, ca_key_kind;
+  if (!ReadKeyKind(request, "key_type", "key_length", &server_key_kind) ||
+      !ReadKeyKind(request, "ca_key_type", "ca_key_length", &ca_key_kind)) {
+    return kErrBadParameter;
+  }
   std::string aliases = request->GetParam("alias", "").asString();
 
   CSR_ARGUMENT ca_record;
@@ -49,7 +52,7 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
   // Everything the steps would refuse is refused before the first file is
   // written, in the order the steps would meet it: the CA's key size, the
   // CA's subject, the server's key size, its subject and the names.
-  if (checkKeySize(static_cast<unsigned int>(ca_key_length)) != 0) {
+  if (checkKeyKind(ca_key_kind) != 0) {
     ORVA_LOG("Generate CA key & crt failed");
     return kErrFailed;
   }
@@ -57,7 +60,7 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
     ORVA_LOG("Generate CA key & crt failed");
     return kErrBadParameter;
   }
-  if (checkKeySize(static_cast<unsigned int>(key_length)) != 0) {
+  if (checkKeyKind(server_key_kind) != 0) {
     ORVA_LOG("Generate server key failed");
     return kErrFailed;
   }
@@ -75,7 +78,7 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
   // the way leaves the running CA, key and certificate together.
   StoreFileSet set;
   std::string ca_key, ca_crt;
-  int made = genCASetInto(&set, &ca_record, ca_key_length, &ca_key, &ca_crt);
+  int made = genCASetInto(&set, &ca_record, ca_key_kind, &ca_key, &ca_crt);
   if (made != 0) {
     ORVA_LOG("Generate CA key & crt failed");
     return made == -2 ? kErrBadParameter : kErrFailed;
@@ -84,7 +87,7 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
       set.Add(OrvaPath(kServerKeyPath), StoreContent::kPrivateKey);
   const std::string server_crt =
       set.Add(OrvaPath(kServerCrtPath), StoreContent::kCertificate);
-  if (genKey(server_key.c_str(), static_cast<unsigned int>(key_length)) == -1) {
+  if (genKeyOf(server_key.c_str(), server_key_kind) == -1) {
     ORVA_LOG("Generate server key failed");
     return kErrFailed;
   }
@@ -100,7 +103,7 @@ int CreateCertificateSet(ORVA::APIRequest* request) {
     ORVA_LOG("Generate crt failed");
     return kErrFailed;
   }
-  if (verifyCrtAndKey(server_crt.c_str(), server_key.c_str(), CYPHER_RSA) != 0) {
+  if (verifyCrtAndKeyOfAnyType(server_crt.c_str(), server_key.c_str()) != 0) {
     ORVA_LOG("Server crt and key is not matching.");
     return kErrFailed;
   }

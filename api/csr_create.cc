@@ -12,8 +12,12 @@ void handleCSRAction(ORVA::APIRequest* request, ORVA::APIResponse* response) {
     response->SetError(kErrFailed, Json::Value());
     return;
   }
-  int key_length = ReadKeyLength(request, "key_length");
-  if (generateCSR(key_length, record) == 0) {
+  KeyKind kind;
+  if (!ReadKeyKind(request, "key_type", "key_length", &kind)) {
+    response->SetError(kErrBadParameter, Json::Value());
+    return;
+  }
+  if (generateCSR(kind, record) == 0) {
     ORVA_LOG_LASTERR("Generate csr from csr action failed");
     response->SetError(kErrFailed, Json::Value());
     return;

@@ -9,7 +9,7 @@
 #include "toolkit/mkcert.h"
 #include "toolkit/store_file.h"
 
-int generateCSR(int keyLength, CSR_ARGUMENT& record) {
+int generateCSR(const KeyKind& kind, CSR_ARGUMENT& record) {
   if (!MakeGenerationArea()) {
     ORVA_LOG("Create %s failed.", kGenDir);
     return 0;
@@ -25,7 +25,7 @@ int generateCSR(int keyLength, CSR_ARGUMENT& record) {
       pending.Add(OrvaPath(kGenCsrPath), StoreContent::kRequest);
   const std::string key =
       pending.Add(OrvaPath(kGenKeyPath), StoreContent::kPrivateKey);
-  if (genKey(key.c_str(), static_cast<unsigned int>(keyLength)) == -1) {
+  if (genKeyOf(key.c_str(), kind) == -1) {
     ORVA_LOG("genKey Error path: %s", kGenKeyPath);
     return 0;
   }

@@ -53,11 +53,12 @@ void FillFromSubject(const Json::Value& subject, CSR_ARGUMENT* record) {
   }
 }
 
-// The key length of the first certificate of the installed server
-// certificate: the RSA modulus size, raised to the smallest size keys are
-// made with, or 2048 for another key type. Returns false (logged) when it
-// cannot be read.
-bool InstalledKeyLength(int* bits) {
+// The key to renew the installed server certificate with: the type of its
+// first certificate's key, RSA at its modulus size raised to the smallest
+// size keys are made with, EC on P-384 for a curve of 384 bits or more and
+// P-256 below, and RSA of 2048 bits for any other type. Returns false
+// (logged) when it cannot be read.
+bool InstalledKeyKind(KeyKind* kind) {
   FilePtr file(std::fopen(OrvaPath(kServerCrtPath).c_str(), "r"));
   if (!file) {
     ORVA_LOG_LASTERR("open %s failed ", kServerCrtPath);
@@ -73,9 +74,17 @@ bool InstalledKeyLength(int* bits) {
     ORVA_LOG_LASTERR("get public key from file failed");
     return false;
   }
-  *bits = EVP_PKEY_base_id(key.get()) == EVP_PKEY_RSA
-              ? std::max(EVP_PKEY_get_bits(key.get()), kMinRsaKeyBits)
-              : kDefaultKeyLength;
+  const int bits = EVP_PKEY_get_bits(key.get());
+  switch (EVP_PKEY_base_id(key.get())) {
+    case EVP_PKEY_RSA:
+      *kind = {KeyAlgorithm::kRsa, std::max(bits, kMinRsaKeyBits)};
+      break;
+    case EVP_PKEY_EC:
+      *kind = {KeyAlgorithm::kEc, bits >= 384 ? 384 : 256};
+      break;
+    default:
+      *kind = {KeyAlgorithm::kRsa, kDefaultKeyLength};
+  }
   return true;
 }
 
@@ -90,13 +99,13 @@ void handleRenewAction(ORVA::APIRequest* request, ORVA::APIResponse* response) {
   }
   CSR_ARGUMENT record;
   FillFromSubject(ServerSubject(info), &record);
-  int key_length = 0;
-  if (!InstalledKeyLength(&key_length)) {
+  KeyKind kind;
+  if (!InstalledKeyKind(&kind)) {
     ORVA_LOG_LASTERR("Getting key length from %s failed", kServerCrtPath);
     response->SetError(kErrFailed, Json::Value());
     return;
   }
-  if (generateCSR(key_length, record) == 0) {
+  if (generateCSR(kind, record) == 0) {
     ORVA_LOG_LASTERR("Generate csr from renew action failed");
     response->SetError(kErrFailed, Json::Value());
     return;

@@ -1,5 +1,5 @@
 """The seven methods as `orva-webapi call` runs them, each with its floor, on
-a device root of their own."""
+a device root of their own, then CRT and CSR create with P-256 keys."""
 
 import json
 import os
@@ -20,6 +20,7 @@ SERVER_SUBJECT = {
     "common_name": "nas.example.com", "email": "admin@example.com",
 }
 ALIASES = "nas.example.com;192.0.2.10"
+EC_KEYS = {"key_type": "ec", "key_length": 256, "ca_key_type": "ec", "ca_key_length": 256}
 DAYS = 3650
 
 
@@ -116,7 +117,7 @@ def prepare(device, ca_bits, server_bits):
 
 
 def build(device, files, ca_bits, server_bits):
-    """The seven methods in table order."""
+    """The seven methods in table order, then the P-256 rows."""
     floor_store = lambda p: os.path.join(device.floor_root, floors.STORE, p)
     sh = lambda path: ["/bin/sh", path]
 
@@ -187,6 +188,17 @@ def build(device, files, ca_bits, server_bits):
                {"additional": '["valid_from","valid_till"]'},
                floor_name="list", floor_text=lambda: floors.nothing(device.floor_root),
                goal=False, note="runs no tool: floor is an empty script"),
+        # Last: they leave an EC set installed, which renew would follow.
+        method("CRT create P-256", "ORVA.Core.Certificate.CRT", "create",
+               dict(CA_SUBJECT, **SERVER_SUBJECT, **EC_KEYS, alias=ALIASES),
+               floor_name="crt-create-ec",
+               floor_text=lambda: floors.crt_create(device.floor_root, "P-256", "P-256"),
+               note="CA + server P-256"),
+        method("CSR create P-256", "ORVA.Core.Certificate.CSR", "create",
+               dict(SERVER_SUBJECT, key_type="ec", key_length=256),
+               floor_name="csr-create-ec",
+               floor_text=lambda: floors.csr_create(device.floor_root, "P-256"),
+               note="P-256"),
     ]
 
 

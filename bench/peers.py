@@ -56,7 +56,8 @@ class EasyRsa:
     build-ca and build-server-full."""
 
     def __init__(self, program, work, ca_bits, server_bits, days, ca_subject,
-                 server_subject, aliases):
+                 server_subject, aliases, curve=None):
+        """`curve` ("prime256v1"): EC keys on it instead of RSA of the sizes."""
         self.program = program
         self.pki = os.path.join(work, "easyrsa-pki")
         self.work = work
@@ -67,6 +68,8 @@ class EasyRsa:
                   "--req-st=" + ca_subject["ca_state"], "--req-city=" + ca_subject["ca_city"],
                   "--req-org=" + ca_subject["ca_organization"],
                   "--req-ou=" + ca_subject["ca_department"]]
+        if curve:
+            common += ["--use-algo=ec", "--curve=" + curve]
         self.build_ca = [program] + common + [
             "--keysize=%d" % ca_bits, "--req-email=" + ca_subject["ca_email"],
             "--req-cn=" + ca_subject["ca_common_name"], "build-ca", "nopass"]
@@ -74,7 +77,7 @@ class EasyRsa:
             "--keysize=%d" % server_bits, "--req-email=" + server_subject["email"],
             "--subject-alt-name=" + alt_names, "build-server-full",
             server_subject["common_name"], "nopass"]
-        self.script = os.path.join(work, "easyrsa-set.sh")
+        self.script = os.path.join(work, "easyrsa-set-%s.sh" % (curve or "rsa"))
         with open(self.script, "w") as script:
             script.write("set -e\n%s >/dev/null 2>&1\n%s >/dev/null 2>&1\n" % (
                 " ".join(shlex.quote(a) for a in self.build_ca),

@@ -81,16 +81,20 @@ def peer_rows(table, keygen, easyrsa):
                   "process | %d | %s | %s | %.2f (%.2f–%.2f) | none (lower bound) | – |" % (
                       keygen["bits"], len(tool.wall), _ms(tool), _ms(inside),
                       tool.median() / inside.median(), low, high))
-    if easyrsa.get("failed"):
-        table.add("| CRT create vs easy-rsa | – | not measured: %s | | | | |" % easyrsa["failed"])
-    else:
-        ours, peer = easyrsa["ours"], easyrsa["peer"]
+    for pair in easyrsa:
+        if pair.get("failed"):
+            table.add("| CRT create vs easy-rsa | – | not measured: %s | | | | |" % pair["failed"])
+            continue
+        ours, peer = pair["ours"], pair["peer"]
+        # With P-256 keys key generation no longer hides the rest: half of
+        # easy-rsa's time is the goal there.
+        goal = 0.5 if "P-256" in pair["note"] else 1.0
         low, high = ratio_interval(ours.wall, peer.wall)
         table.add("| CRT create vs easy-rsa build-ca + build-server-full (%s) | %d | %s | %s "
-                  "| %.2f (%.2f–%.2f) | < 1 | %s |" % (
-                      easyrsa["note"], len(ours.wall), _ms(ours), _ms(peer),
-                      ours.median() / peer.median(), low, high,
-                      _verdict(low, high, 1.0)))
+                  "| %.2f (%.2f–%.2f) | < %g | %s |" % (
+                      pair["note"], len(ours.wall), _ms(ours), _ms(peer),
+                      ours.median() / peer.median(), low, high, goal,
+                      _verdict(low, high, goal)))
     table.add()
 
 

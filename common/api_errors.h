@@ -16,6 +16,9 @@ enum ApiError {
   kErrChain = 5517,               // the intermediate did not issue the certificate
   kErrDsaKey = 5518,              // DSA keys are refused
   kErrCsrHeader = 5519,           // request file lacks "CERTIFICATE REQUEST"
+  // The second module's codes.
+  kErrBundlePassword = 5520,      // the bundle's password is wrong or missing
+  kErrBundleNoPair = 5521,        // the bundle holds no key, or no certificate of its key
 };
 
 #endif  // ORVA_COMMON_API_ERRORS_H_

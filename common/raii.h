@@ -3,7 +3,10 @@
 
 #include <dirent.h>
 #include <openssl/bio.h>
+#include <openssl/crypto.h>
 #include <openssl/evp.h>
+#include <openssl/pkcs12.h>
+#include <openssl/provider.h>
 #include <openssl/x509.h>
 #include <openssl/x509v3.h>
 
@@ -57,5 +60,29 @@ struct X509StackDeleter {
   void operator()(STACK_OF(X509)* stack) const { sk_X509_pop_free(stack, X509_free); }
 };
 using X509StackPtr = std::unique_ptr<STACK_OF(X509), X509StackDeleter>;
+
+struct Pkcs12Deleter {
+  void operator()(PKCS12* bundle) const { PKCS12_free(bundle); }
+};
+using Pkcs12Ptr = std::unique_ptr<PKCS12, Pkcs12Deleter>;
+
+// A provider loaded into a library context must be unloaded before the
+// context is freed.
+struct LibraryContextDeleter {
+  void operator()(OSSL_LIB_CTX* context) const { OSSL_LIB_CTX_free(context); }
+};
+using LibraryContextPtr = std::unique_ptr<OSSL_LIB_CTX, LibraryContextDeleter>;
+
+struct ProviderUnloader {
+  void operator()(OSSL_PROVIDER* provider) const { OSSL_PROVIDER_unload(provider); }
+};
+using ProviderPtr = std::unique_ptr<OSSL_PROVIDER, ProviderUnloader>;
+
+// Memory the library allocated (OPENSSL_malloc) for the caller.
+struct OpensslFree {
+  void operator()(void* memory) const { OPENSSL_free(memory); }
+};
+template <typename T>
+using OpensslMemoryPtr = std::unique_ptr<T, OpensslFree>;
 
 #endif  // ORVA_COMMON_RAII_H_

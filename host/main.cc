@@ -8,6 +8,7 @@
 #include <cstring>
 #include <fstream>
 #include <iostream>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -98,11 +99,18 @@ int RunCall(const std::string& root, const CallArguments& arguments) {
       return 1;
     }
   }
-  ModuleLoader module;
+  std::vector<std::unique_ptr<ModuleLoader>> modules;
+  ORVA::APITable table;  // the module serving the call; none answers 404
   std::string error;
-  if (!module.Load(ModuleLoader::DefaultModulePath(), &error)) {
-    std::fprintf(stderr, "orva-webapi: %s\n", error.c_str());
-    return 1;
+  for (const std::string& path : ModuleLoader::DefaultModulePaths()) {
+    modules.push_back(std::make_unique<ModuleLoader>());
+    if (!modules.back()->Load(path, &error)) {
+      std::fprintf(stderr, "orva-webapi: %s\n", error.c_str());
+      return 1;
+    }
+    if (FindApiRow(modules.back()->table(), arguments.api, arguments.method, 1)) {
+      table = modules.back()->table();
+    }
   }
   Json::Value params = arguments.params;
   TemporaryUploads uploads;
@@ -121,7 +129,7 @@ int RunCall(const std::string& root, const CallArguments& arguments) {
   }
   openlog("orva-webapi", LOG_PERROR | LOG_PID, LOG_USER);
   CallOutcome outcome =
-      CallApi(module.table(), arguments.api, arguments.method, 1, params);
+      CallApi(table, arguments.api, arguments.method, 1, params);
   return PrintOutcome(outcome, arguments.output);
 }
 

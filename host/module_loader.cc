@@ -31,6 +31,7 @@ bool ModuleLoader::Load(const std::string& path, std::string* error) {
   return true;
 }
 
-std::string ModuleLoader::DefaultModulePath() {
-  return ExecutableDirectory() + "/ORVA.Core.Certificate.so";
+std::vector<std::string> ModuleLoader::DefaultModulePaths() {
+  return {ExecutableDirectory() + "/ORVA.Core.Certificate.so",
+          ExecutableDirectory() + "/ORVA.Core.Certificate.Extra.so"};
 }

@@ -2,6 +2,7 @@
 #define ORVA_HOST_MODULE_LOADER_H_
 
 #include <string>
+#include <vector>
 
 #include "platform/webapi/api_table.h"
 
@@ -21,8 +22,9 @@ class ModuleLoader {
   // The module's table (rows owned by the module); empty before Load.
   const ORVA::APITable& table() const { return table_; }
 
-  // The certificate module installed beside this executable.
-  static std::string DefaultModulePath();
+  // The modules installed beside this executable, loaded by default: the
+  // certificate module, then its second module.
+  static std::vector<std::string> DefaultModulePaths();
 
  private:
   void* library_ = nullptr;

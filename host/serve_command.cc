@@ -81,7 +81,7 @@ int RunServe(const ServeOptions& options) {
   if (!token.LoadFromFile(TokenPath(root), &error)) return Fail(error + " (run init)");
 
   std::vector<std::unique_ptr<ModuleLoader>> modules;
-  std::vector<std::string> paths = {ModuleLoader::DefaultModulePath()};
+  std::vector<std::string> paths = ModuleLoader::DefaultModulePaths();
   paths.insert(paths.end(), options.modules.begin(), options.modules.end());
   std::vector<ORVA::APITable> tables;
   for (const std::string& path : paths) {

@@ -17,4 +17,23 @@ bool MakeGenerationArea();
 // renamed before the request ends.
 std::string GenerationWorkPath(const char* name);
 
+// A private file (0600) at GenerationWorkPath(name) for work in progress,
+// removed with the object. The caller makes the area first.
+class GenerationWorkFile {
+ public:
+  explicit GenerationWorkFile(const char* name) : path_(GenerationWorkPath(name)) {}
+  ~GenerationWorkFile();
+
+  GenerationWorkFile(const GenerationWorkFile&) = delete;
+  GenerationWorkFile& operator=(const GenerationWorkFile&) = delete;
+
+  // Replaces the file's content with `content`, never through a link.
+  // False (errno set) when it cannot be written.
+  bool Write(const std::string& content);
+  const std::string& path() const { return path_; }
+
+ private:
+  std::string path_;
+};
+
 #endif  // ORVA_TOOLKIT_GENERATION_AREA_H_

@@ -9,6 +9,7 @@
 #include "platform/olib/olib_szlist.h"
 #include "platform/olib/olib_types.h"
 #include "toolkit/csr_argument.h"
+#include "toolkit/key_kind.h"
 #include "toolkit/request_facts.h"
 #include "toolkit/store_file.h"
 
@@ -48,6 +49,15 @@ int genKey(const char* keyPath, unsigned int bits);
 // device's own HTTPS can use) to 16384 bits; -1 (logged with the size)
 // otherwise.
 int checkKeySize(unsigned int bits);
+
+// genKey for any kind: RSA keys as genKey makes them, EC keys on the named
+// curve of `kind` (written by the tool as "BEGIN PRIVATE KEY"). 0 on
+// success; -1 (logged) as genKey, or for a kind checkKeyKind refuses.
+int genKeyOf(const char* keyPath, const KeyKind& kind);
+
+// 0 for a kind genKeyOf makes: RSA sizes checkKeySize accepts, EC on P-256
+// or P-384; -1 (logged with the kind) otherwise.
+int checkKeyKind(const KeyKind& kind);
 
 // Writes the request configuration at `configPath` from `subject` and makes
 // a request for the existing key `keyPath` at `requestPath` (mode 0400).
@@ -151,7 +161,16 @@ int getMd5(char* output, int size, const ShellCommand& command);
 // files in place first (the key's only when the certificate's succeeded).
 int verifyCrtAndKey(const char* certPath, const char* keyPath, CYPHER keyType);
 
-// Makes the local CA in the store: key (`bits`), request from `subject`
+// Whether the key at `keyPath` belongs to the first certificate of
+// `certPath`, for any key type: an RSA certificate as verifyCrtAndKey
+// compares it (a key that shows no modulus does not match), other
+// certificates by the library's comparison of their public keys. 0 when
+// they belong together; 1 when not; -1 (logged) when the digest of an RSA
+// certificate cannot be made, or another certificate or its key cannot be
+// read (an encrypted key is never asked a password for).
+int verifyCrtAndKeyOfAnyType(const char* certPath, const char* keyPath);
+
+// Makes the local CA in the store: RSA key (`bits`), request from `subject`
 // with the configuration "/usr/orva/etc/ssl/cfg.d/ca.cfg", self-signed
 // certificate for 3650 days, and proves the pair. The three are made under
 // work names and installed together once proved. 0 on success, otherwise
@@ -160,12 +179,13 @@ int verifyCrtAndKey(const char* certPath, const char* keyPath, CYPHER keyType);
 // was (only its configuration and extension files are rewritten).
 int genCASet(CSR_ARGUMENT* subject, int bits);
 
-// Makes the local CA as genCASet does, as members of `set`, which the
+// Makes the local CA as genCASet does, with a key of `kind` (refused with
+// -1 by checkKeyKind), as members of `set`, which the
 // caller installs with files that must go with it. Stores the temporary
 // paths of the new CA key and certificate in *key and *certificate (for
 // signing before the install). The results are genCASet's; nothing is
 // installed either way.
-int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, int bits,
+int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, const KeyKind& kind,
                  std::string* key, std::string* certificate);
 
 // Appends every certificate of the PEM file at `path` to `certificates`,

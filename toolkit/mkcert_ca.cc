@@ -11,7 +11,7 @@ namespace {
 constexpr int kCaValidityDays = 3650;
 }  // namespace
 
-int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, int bits,
+int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, const KeyKind& kind,
                  std::string* key, std::string* certificate) {
   for (const char* path : {kCaCsrPath, kCaCrtPath, kCaKeyPath}) {
     if (genDir(OrvaPath(path).c_str()) != 0) {
@@ -23,7 +23,7 @@ int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, int bits,
   *certificate = set->Add(OrvaPath(kCaCrtPath), StoreContent::kCertificate);
   *key = set->Add(OrvaPath(kCaKeyPath), StoreContent::kPrivateKey);
 
-  int result = genKey(key->c_str(), static_cast<unsigned int>(bits));
+  int result = genKeyOf(key->c_str(), kind);
   if (result != 0) {
     ORVA_LOG("genCAKey() failed");
     return result;
@@ -40,7 +40,7 @@ int genCASetInto(StoreFileSet* set, CSR_ARGUMENT* subject, int bits,
     ORVA_LOG("genCACrt() failed");
     return result;
   }
-  result = verifyCrtAndKey(certificate->c_str(), key->c_str(), CYPHER_RSA);
+  result = verifyCrtAndKeyOfAnyType(certificate->c_str(), key->c_str());
   if (result != 0) ORVA_LOG("Root certificate and key is not matching");
   return result;
 }
@@ -50,7 +50,7 @@ int genCASet(CSR_ARGUMENT* subject, int bits) {
   // beside the certificate of another key could sign nothing.
   StoreFileSet set;
   std::string key, certificate;
-  int result = genCASetInto(&set, subject, bits, &key, &certificate);
+  int result = genCASetInto(&set, subject, {KeyAlgorithm::kRsa, bits}, &key, &certificate);
   if (result != 0) return result;
   if (set.Install() != 0) {
     ORVA_LOG("Install CA set failed");

@@ -1,11 +1,16 @@
-// Whether a private key belongs to a certificate, by the digests of their
-// RSA moduli.
+// Whether a private key belongs to a certificate: by the digests of their
+// RSA moduli, or for other keys by the library.
+
+#include <openssl/err.h>
+#include <openssl/pem.h>
 
 #include <cstdio>
 #include <cstring>
 #include <string>
 
 #include "common/log.h"
+#include "common/pem_password.h"
+#include "common/raii.h"
 #include "platform/olib/olib_file.h"
 #include "toolkit/mkcert.h"
 #include "toolkit/mkcert_internal.h"
@@ -75,4 +80,28 @@ int verifyCrtAndKey(const char* certPath, const char* keyPath, CYPHER keyType) {
     return -1;
   }
   return std::strcmp(key_digest, certificate_digest) == 0 ? 0 : 1;
+}
+
+int verifyCrtAndKeyOfAnyType(const char* certPath, const char* keyPath) {
+  FilePtr certificate_file(std::fopen(certPath, "r"));
+  X509Ptr certificate(certificate_file ? PEM_read_X509(certificate_file.get(), nullptr,
+                                                       RefusePemPassword, nullptr)
+                                       : nullptr);
+  if (certificate &&
+      EVP_PKEY_get_base_id(X509_get0_pubkey(certificate.get())) == EVP_PKEY_RSA) {
+    // Not CYPHER_RSA: a key that shows no modulus is another type's, no match.
+    return verifyCrtAndKey(certPath, keyPath, CYPHER_NONE);
+  }
+  FilePtr key_file(std::fopen(keyPath, "r"));
+  EvpPkeyPtr key(key_file ? PEM_read_PrivateKey(key_file.get(), nullptr, RefusePemPassword,
+                                                nullptr)
+                          : nullptr);
+  if (!certificate || !key) {
+    ERR_clear_error();
+    ORVA_LOG("Read crt %s or key %s failed", certPath, keyPath);
+    return -1;
+  }
+  int match = X509_check_private_key(certificate.get(), key.get()) == 1 ? 0 : 1;
+  ERR_clear_error();  // A refused pair leaves nothing for later callers.
+  return match;
 }

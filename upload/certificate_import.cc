@@ -17,6 +17,7 @@
 #include "platform/olib/orva_root.h"
 #include "toolkit/activation.h"
 #include "toolkit/store_file.h"
+#include "upload/imported_set.h"
 #include "upload/sslca_form_handler.h"
 
 namespace {
@@ -61,11 +62,8 @@ bool KeepCertificatesOnly(const std::string& path) {
   return true;
 }
 
-// Copies the validated uploads into the store: the certificate, the key and,
-// when `interPath` is not null, the intermediate certificate; without one the
-// installed intermediate certificate is removed. Every source is checked and
-// every copy made before the first store file is replaced, so a refused or
-// failed copy leaves the store files as they were. Returns 5502 or 5515.
+}  // namespace
+
 int InstallUploads(const std::string& certPath, const std::string& keyPath,
                    const std::string* interPath) {
   for (const std::string* source : {&certPath, &keyPath, interPath}) {
@@ -113,8 +111,6 @@ int InstallUploads(const std::string& certPath, const std::string& keyPath,
   }
   return kErrNone;
 }
-
-}  // namespace
 
 void SSLCAFormHandler::ProcessJsonReq(ORVA::APIRequest* request,
                                       ORVA::APIResponse* response) {

@@ -66,6 +66,10 @@ TEST(Refusals, LeaveTheStoreAsItWasAndActivateNothing) {
       {crt, R"({"key_length":"1024"})", 5501,
        "Key size 1024 refused: RSA keys have 2048 to 16384 bits"},
       {crt, R"({"key_length":"16385"})", 5501, ""},
+      {doCertificateCreateCSR_v1, R"({"key_type":"dsa"})", 5503,
+       "Key type \"dsa\" refused: keys are \"rsa\" or \"ec\""},
+      {crt, R"({"ca_key_type":"ec","ca_key_length":"521"})", 5501,
+       "EC key size 521 refused: EC keys are made on P-256 or P-384"},
       {crt, R"({"common_name":"My NAS"})", 5501,
        "The certificate would name no host: no alias, and the common name is no host name"},
       {doCertificateCreateCSR_v1, R"({"key_length":"4294969344"})", 5501, ""},  // 2^32 + 2048
@@ -93,7 +97,7 @@ TEST(CsrRenew, RepeatsTheInstalledSubjectAndKeySize) {
   cases[] = {
       {"/C=DE/O=Org/CN=nas.local", "C=DE, O=Org, CN=nas.local", 2304, KeyType::kRsa, "(2304 bit)"},
       {"/C=TW/CN=small.local", "C=TW, CN=small.local", 1024, KeyType::kRsa, "(2048 bit)"},
-      {"/C=TW/CN=ec.local", "C=TW, CN=ec.local", 0, KeyType::kEc, "(2048 bit)"},
+      {"/C=TW/CN=ec.local", "C=TW, CN=ec.local", 0, KeyType::kEc, "(256 bit)"},
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(c.subject);

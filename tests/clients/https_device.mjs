@@ -23,9 +23,9 @@ export async function call(root, api, method, params = {}, extra = []) {
 
 // A device for test `t` in a fresh folder (removed after it), whose local
 // CA and server certificate CRT create made for `commonName`, with `alias`
-// and, when `email` is set, an e-mail address for both. Resolves with
-// { root, folder }.
-export async function createDevice(t, { commonName, alias = '', email = false }) {
+// and, when `email` is set, an e-mail address for both, and the key
+// parameters `keys` (RSA 2048 when empty). Resolves with { root, folder }.
+export async function createDevice(t, { commonName, alias = '', email = false, keys = {} }) {
   const folder = await mkdtemp(path.join(os.tmpdir(), 'orva-clients-'));
   t.after(() => rm(folder, { recursive: true, force: true }));
   const root = path.join(folder, 'device');
@@ -35,7 +35,7 @@ export async function createDevice(t, { commonName, alias = '', email = false })
     { country: 'DE', organization: 'Device Maker', common_name: name,
       email: email ? 'admin@device.example' : '' }[field] ?? '']));
   await call(root, 'ORVA.Core.Certificate.CRT', 'create',
-    { ...subject('ca_', 'Device Test CA'), ...subject('', commonName), alias });
+    { ...subject('ca_', 'Device Test CA'), ...subject('', commonName), alias, ...keys });
   return { root, folder };
 }
 

@@ -72,6 +72,11 @@ const CASES = [
   },
   { what: 'CRT create, address as common name', reached: ['127.0.0.1'] },
   {
+    what: 'CRT create, EC keys (P-256 server, P-384 CA)', alias: 'nas.example',
+    reached: ['device.example', 'nas.example'],
+    keys: { key_type: 'ec', key_length: 256, ca_key_type: 'ec', ca_key_length: 384 },
+  },
+  {
     what: 'CSR sign, names from the request', reached: ['signed.example', 'alt.example', '10.0.0.9'],
     request: 'subjectAltName=DNS:alt.example,IP:10.0.0.9',
   },

@@ -116,7 +116,7 @@ test('walks one device through the token gate, the list and every form', { timeo
     await open('csr-create');
     await field('csr-create', 'country').fill('gb');
     await field('csr-create', 'common_name').fill('files.example.co.uk');
-    await field('csr-create', 'key_length').selectOption('3072');
+    await field('csr-create', 'key_length').selectOption('rsa:3072');
     const pending = await download(device, 'csr-create');
     assert.match((await run('openssl', ['req', '-in', pending('server.csr'), '-noout', '-text']))
       .stdout, /Subject: C ?= ?GB,[^]*3072 bit/);
@@ -168,6 +168,20 @@ test('walks one device through the token gate, the list and every form', { timeo
       /^expiring: Server files\.example\.co\.uk Local certificate .* (19|20)Expires soon It expires /);
     assert.match(intermediate, /^valid: Intermediate Local certificate authority Self-signed/);
     await screenshot(page, '07-imported-three-rows');
+    await open('export-bundle');
+    await field('export-bundle', 'password').fill('bundle-pass');
+    const [bundle, exportedBundle] = await Promise.all([
+      page.waitForEvent('download', WAIT), outcomeOf(page, 'export-bundle')]);
+    assert.match(`${bundle.suggestedFilename()} ${exportedBundle}`, /^server\.p12 success: /);
+    assert.match((await run('openssl', ['pkcs12', '-info', '-nodes', '-passin', 'pass:bundle-pass',
+      '-in', await bundle.path()])).stdout, /BEGIN PRIVATE KEY/);
+    await open('import-bundle');
+    await field('import-bundle', 'bundle').setInputFiles(await bundle.path());
+    await field('import-bundle', 'password').fill('wrong-pass');
+    assert.match(await outcomeOf(page, 'import-bundle'), /^error: .*\(error 5520\)$/);
+    await field('import-bundle', 'password').fill('bundle-pass');
+    assert.match(await outcomeOf(page, 'import-bundle'), /^success: /);
+    await screenshot(page, '07b-bundle-imported');
     await page.setViewportSize({ width: 360, height: 800 });
     await screenshot(page, '08-narrow-screen');
 

@@ -20,6 +20,13 @@ function subject(values, prefix = '') {
   return params;
 }
 
+// The key chosen as "TYPE:BITS" in the select `${prefix}key_length`, as the
+// device's parameters key_type and key_length named with `prefix`.
+function keyChoice(values, prefix = '') {
+  const [type, bits] = text(values, `${prefix}key_length`).split(':');
+  return { [`${prefix}key_type`]: type, [`${prefix}key_length`]: bits ?? '' };
+}
+
 // A chosen file, or null when the file input was left empty.
 function chosenFile(values, name) {
   const file = values.get(name);
@@ -37,9 +44,13 @@ function clearFiles(form) {
 // to add. Returns the run functions of the forms, by data-action.
 export function actionRuns(api, installed) {
   async function downloadNow(set, context, lead) {
+    return downloadFrom('ORVA.Core.Certificate', 'export', { file: set }, context, lead);
+  }
+
+  async function downloadFrom(apiName, method, params, context, lead) {
     let file;
     try {
-      file = await api.download(set);
+      file = await api.download(apiName, method, params);
     } catch (error) {
       throw new StepFailure(error, context, lead);
     }
@@ -61,8 +72,8 @@ export function actionRuns(api, installed) {
       const params = {
         ...subject(values),
         ...subject(values, 'ca_'),
-        key_length: text(values, 'key_length'),
-        ca_key_length: text(values, 'ca_key_length'),
+        ...keyChoice(values),
+        ...keyChoice(values, 'ca_'),
         alias: joinAliases(text(values, 'alias')),
       };
       const data = await api.call('ORVA.Core.Certificate.CRT', 'create', params);
@@ -75,7 +86,7 @@ export function actionRuns(api, installed) {
     'csr-create': async (values) => {
       await api.call('ORVA.Core.Certificate.CSR', 'create', {
         ...subject(values),
-        key_length: text(values, 'key_length'),
+        ...keyChoice(values),
       });
       return pendingSetDownloaded('made');
     },
@@ -91,6 +102,14 @@ export function actionRuns(api, installed) {
       if (intermediate !== null) files.inter_cert = intermediate;
       const data = await api.call('ORVA.Core.Certificate', 'import', {}, files);
       clearFiles(form);
+      return { text: `The certificate is installed. ${installed(data)}` };
+    },
+
+    'import-bundle': async (values, form) => {
+      const data = await api.call('ORVA.Core.Certificate.Bundle', 'import',
+        { password: values.get('password') ?? '' }, { bundle: chosenFile(values, 'bundle') });
+      clearFiles(form);
+      form.querySelector('[name="password"]').value = '';
       return { text: `The certificate is installed. ${installed(data)}` };
     },
 
@@ -113,6 +132,20 @@ export function actionRuns(api, installed) {
         'The download failed.');
       return { text: `The installed set was downloaded as ${fileName}. It holds private keys: keep it safe.` };
     },
+
+    'export-bundle': async (values) => {
+      const format = text(values, 'format');
+      const params = format === 'pkcs12'
+        ? { format, password: values.get('password') ?? '', legacy: text(values, 'legacy') || 'no' }
+        : { format, include_key: text(values, 'include_key') || 'no' };
+      const fileName = await downloadFrom('ORVA.Core.Certificate.Bundle', 'export', params,
+        'export-bundle', 'The download failed.');
+      const secret = format === 'pkcs12' || params.include_key === 'yes';
+      return {
+        text: `The server certificate was downloaded as ${fileName}.` +
+          (secret ? ' It holds the private key: keep it safe.' : ''),
+      };
+    },
   };
 }
 
@@ -125,6 +158,8 @@ export const BUSY_TEXTS = {
   'csr-create': MAKING_REQUEST,
   'csr-renew': MAKING_REQUEST,
   import: 'Checking and installing the files…',
+  'import-bundle': 'Opening, checking and installing the bundle…',
   'csr-sign': 'Signing the request…',
   export: 'Packing the files…',
+  'export-bundle': 'Making the file…',
 };

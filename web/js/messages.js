@@ -20,6 +20,9 @@ const MODULE_ERRORS = {
   5518: 'DSA keys are not accepted. Use an RSA or EC key.',
   5519: 'The file is not a certificate signing request: its first line must be ' +
     '“-----BEGIN CERTIFICATE REQUEST-----”.',
+  5520: 'The password does not open the file or its key. Nothing was changed.',
+  5521: 'The file holds no private key, or no certificate that belongs to its key. ' +
+    'Nothing was changed.',
 };
 
 // Refusals of the server itself, by HTTP status.
@@ -29,6 +32,9 @@ const HOST_ERRORS = {
   413: 'The files are too large to upload. Certificates and keys are a few kilobytes.',
   500: 'The device could not finish the request.',
 };
+
+const KEY_REFUSED = 'The private key does not belong to the certificate, or it is smaller than ' +
+  'the device’s HTTPS can use (RSA keys need 2048 bits, EC keys 256). Nothing was changed.';
 
 // Where the general sentence is too vague, the form that sent the request says more.
 const CONTEXT_ERRORS = {
@@ -43,7 +49,7 @@ const CONTEXT_ERRORS = {
   },
   'csr-create': {
     5501: 'The device could not make the key and request. ' +
-      'Check that the country is two letters and the key size is one of those offered.',
+      'Check that the country is two letters and the key is one of those offered.',
   },
   'csr-renew': {
     5501: 'No request could be made from the installed certificate. A server certificate must ' +
@@ -51,9 +57,18 @@ const CONTEXT_ERRORS = {
   },
   import: {
     5501: 'The device could not read the uploaded files.',
-    5514: 'The private key does not belong to the certificate, or it is smaller than the ' +
-      'device’s HTTPS can use (RSA keys need 2048 bits, EC keys 256). Nothing was changed.',
+    5514: KEY_REFUSED,
     5503: 'Choose a certificate file and a private key file.',
+  },
+  'import-bundle': {
+    5514: KEY_REFUSED,
+    5517: 'A certificate of the file is not part of its certificate’s chain. ' +
+      'Nothing was changed.',
+    5503: 'Choose a bundle file.',
+  },
+  'export-bundle': {
+    5503: 'A PKCS#12 file needs a password of at least 8 characters.',
+    5504: 'No server certificate with its key is installed.',
   },
   'csr-sign': {
     5501: 'The request could not be signed. The device needs a local certificate authority ' +

@@ -1,8 +1,16 @@
 // Builds the subject fields (country, state, ... e-mail) of the forms from one
-// template, and the key size choices, with their defaults.
+// template, and the key choices, with their defaults.
 
-const KEY_SIZES = [2048, 3072, 4096];
-const DEFAULT_KEY_SIZE = 2048;
+// "TYPE:BITS" as the forms send it; a P-256 key is made at once and every
+// current client takes it, where an RSA key takes seconds.
+const KEY_CHOICES = [
+  ['ec:256', 'EC P-256 (recommended)'],
+  ['ec:384', 'EC P-384'],
+  ['rsa:2048', 'RSA 2048 bits'],
+  ['rsa:3072', 'RSA 3072 bits'],
+  ['rsa:4096', 'RSA 4096 bits'],
+];
+const DEFAULT_KEY_CHOICE = 'ec:256';
 
 const CA_DEFAULT_COMMON_NAME = 'Local certificate authority';
 
@@ -45,21 +53,21 @@ function fillSubject(fieldset, template, formId) {
   }
 }
 
-function fillKeySizes(select) {
-  for (const size of KEY_SIZES) {
+function fillKeyChoices(select) {
+  for (const [value, label] of KEY_CHOICES) {
     const option = document.createElement('option');
-    option.value = String(size);
-    option.textContent = `${size} bits`;
-    option.selected = size === DEFAULT_KEY_SIZE;
+    option.value = value;
+    option.textContent = label;
+    option.selected = value === DEFAULT_KEY_CHOICE;
     select.append(option);
   }
 }
 
-// Prepares every subject fieldset and key size choice inside `root`.
+// Prepares every subject fieldset and key choice inside `root`.
 export function buildSubjectFields(root, template) {
   for (const fieldset of root.querySelectorAll('fieldset[data-subject]')) {
     const form = fieldset.closest('form');
     fillSubject(fieldset, template, form.dataset.action);
   }
-  root.querySelectorAll('select[data-key-sizes]').forEach(fillKeySizes);
+  root.querySelectorAll('select[data-key-choices]').forEach(fillKeyChoices);
 }

@@ -71,12 +71,11 @@ export class WebApi {
       ? { ...data, web_certificate: certificate } : data;
   }
 
-  // Asks the export method for a set ("archive", "csr_set", "signed_set").
-  // Resolves with { blob, fileName }; rejects with an ApiError when the
-  // device sends no file.
-  async download(set) {
-    const response = await this.send(
-      requestBody('ORVA.Core.Certificate', 'export', { file: set }, {}));
+  // Calls a method that answers with a file (the export methods). Resolves
+  // with { blob, fileName }; rejects with an ApiError when the device sends
+  // no file.
+  async download(api, method, params) {
+    const response = await this.send(requestBody(api, method, params, {}));
     const disposition = response.headers.get('content-disposition') || '';
     if (response.ok && /attachment/i.test(disposition)) {
       return { blob: await response.blob(), fileName: offeredFileName(disposition) };
