@@ -8,7 +8,6 @@
 #include "api/certificate.h"
 #include "common/store_paths.h"
 #include "tests/support/certificates.h"
-#include "tests/support/inspect.h"
 #include "tests/support/method_calls.h"
 #include "tests/support/test_support.h"
 #include "toolkit/mkcert.h"
@@ -41,9 +40,13 @@ TEST(EcKeys, CreateRenewAndSignKeepTheKeyAskedFor) {
     EXPECT_NE(std::string::npos, PemText(server_crt).find(c.server_key));
     EXPECT_TRUE(RunForTest("openssl verify -x509_strict -CAfile '" + ca_crt + "' '" +
                            server_crt + "'"));
-    ASSERT_TRUE(Succeeded(CallRenew()));
+    ASSERT_TRUE(Succeeded(CallMethod(doCertificateRenew_v1).response));
     EXPECT_NE(std::string::npos, PemText(root.Path(kGenCsrPath)).find(c.server_key));
-    ASSERT_TRUE(Succeeded(CallSign(root.Path(kGenCsrPath))));
+    Json::Value sign(Json::objectValue);
+    sign["days"] = "30";
+    sign["csr"] = "request.csr";
+    sign["csr_tmp"] = root.Path(kGenCsrPath);
+    ASSERT_TRUE(Succeeded(CallMethod(doCertificateSign_v1, sign).response));
     const std::string signed_text = PemText(root.Path(kGenCrtPath));
     EXPECT_NE(std::string::npos, signed_text.find(c.server_key));
     EXPECT_EQ(std::string(c.type) == "rsa",

@@ -58,9 +58,9 @@ bool MakeRequest(const std::string& keyPath, const std::string& csrPath,
 
 bool MakeSignedCertificate(const std::string& caKeyPath, const std::string& caCertPath,
                            const std::string& keyPath, const std::string& certPath,
-                           const std::string& subject, int bits) {
+                           const std::string& subject, int bits, KeyType type) {
   const std::string csr = certPath + ".csr";
-  bool made = NewKeyRequest(keyPath, csr, bits, KeyType::kRsa, "-subj " + Quote(subject)) &&
+  bool made = NewKeyRequest(keyPath, csr, bits, type, "-subj " + Quote(subject)) &&
               RunForTest("openssl x509 -req -in " + Quote(csr) + " -CA " + Quote(caCertPath) +
                          " -CAkey " + Quote(caKeyPath) + " -set_serial 7 -days 200 -out " +
                          Quote(certPath));

@@ -15,10 +15,11 @@ bool MakeSelfSignedCa(const std::string& keyPath, const std::string& certPath,
                       const std::string& subject, int bits = 2048,
                       KeyType type = KeyType::kRsa);
 
-// A new RSA key and a certificate for `subject` signed by the CA.
+// A new key and a certificate for `subject` signed by the CA.
 bool MakeSignedCertificate(const std::string& caKeyPath, const std::string& caCertPath,
                            const std::string& keyPath, const std::string& certPath,
-                           const std::string& subject, int bits = 2048);
+                           const std::string& subject, int bits = 2048,
+                           KeyType type = KeyType::kRsa);
 
 // A new RSA key of 2048 bits and a certificate signing request for `subject`.
 bool MakeRequest(const std::string& keyPath, const std::string& csrPath,
