@@ -161,6 +161,15 @@ int getMd5(char* output, int size, const ShellCommand& command);
 // files in place first (the key's only when the certificate's succeeded).
 int verifyCrtAndKey(const char* certPath, const char* keyPath, CYPHER keyType);
 
+// True when the first certificate of `certPath` has an RSA key, the only
+// kind whose pair the openssl tool's modulus digests can compare.
+bool HasRsaCertificate(const char* certPath);
+
+// The library's proof that the key at `keyPath` belongs to the first
+// certificate of `certPath`: 0 when it does, 1 when not, -1 (not logged)
+// when either cannot be read. An encrypted key is never opened.
+int proveCrtAndKey(const char* certPath, const char* keyPath);
+
 // Whether the key at `keyPath` belongs to the first certificate of
 // `certPath`, for any key type: an RSA certificate as verifyCrtAndKey
 // compares it (a key that shows no modulus does not match), other

@@ -82,26 +82,36 @@ int verifyCrtAndKey(const char* certPath, const char* keyPath, CYPHER keyType) {
   return std::strcmp(key_digest, certificate_digest) == 0 ? 0 : 1;
 }
 
-int verifyCrtAndKeyOfAnyType(const char* certPath, const char* keyPath) {
+bool HasRsaCertificate(const char* certPath) {
+  FilePtr file(std::fopen(certPath, "r"));
+  X509Ptr certificate(file ? PEM_read_X509(file.get(), nullptr, RefusePemPassword, nullptr)
+                           : nullptr);
+  ERR_clear_error();
+  return certificate &&
+         EVP_PKEY_get_base_id(X509_get0_pubkey(certificate.get())) == EVP_PKEY_RSA;
+}
+
+int proveCrtAndKey(const char* certPath, const char* keyPath) {
   FilePtr certificate_file(std::fopen(certPath, "r"));
+  FilePtr key_file(std::fopen(keyPath, "r"));
   X509Ptr certificate(certificate_file ? PEM_read_X509(certificate_file.get(), nullptr,
                                                        RefusePemPassword, nullptr)
                                        : nullptr);
-  if (certificate &&
-      EVP_PKEY_get_base_id(X509_get0_pubkey(certificate.get())) == EVP_PKEY_RSA) {
-    // Not CYPHER_RSA: a key that shows no modulus is another type's, no match.
-    return verifyCrtAndKey(certPath, keyPath, CYPHER_NONE);
-  }
-  FilePtr key_file(std::fopen(keyPath, "r"));
   EvpPkeyPtr key(key_file ? PEM_read_PrivateKey(key_file.get(), nullptr, RefusePemPassword,
                                                 nullptr)
                           : nullptr);
-  if (!certificate || !key) {
-    ERR_clear_error();
-    ORVA_LOG("Read crt %s or key %s failed", certPath, keyPath);
-    return -1;
-  }
-  int match = X509_check_private_key(certificate.get(), key.get()) == 1 ? 0 : 1;
+  int match = -1;
+  if (certificate && key) match = X509_check_private_key(certificate.get(), key.get()) == 1 ? 0 : 1;
   ERR_clear_error();  // A refused pair leaves nothing for later callers.
+  return match;
+}
+
+int verifyCrtAndKeyOfAnyType(const char* certPath, const char* keyPath) {
+  if (HasRsaCertificate(certPath)) {
+    // Not CYPHER_RSA: a key that shows no modulus is another type's, no match.
+    return verifyCrtAndKey(certPath, keyPath, CYPHER_NONE);
+  }
+  const int match = proveCrtAndKey(certPath, keyPath);
+  if (match == -1) ORVA_LOG("Read crt %s or key %s failed", certPath, keyPath);
   return match;
 }

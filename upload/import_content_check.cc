@@ -32,35 +32,15 @@ bool HoldsCertificate(const char* path) {
 // encrypted key is not decrypted: no password is supplied, so it fails to
 // load.
 int ProvePairWithLibrary(const char* certPath, const char* keyPath) {
-  FilePtr certFile(std::fopen(certPath, "r"));
   FilePtr keyFile(std::fopen(keyPath, "r"));
-  if (!certFile || !keyFile) return kErrKeyMismatch;
-  X509Ptr certificate(
-      PEM_read_X509(certFile.get(), nullptr, RefusePemPassword, nullptr));
-  EvpPkeyPtr key(
-      PEM_read_PrivateKey(keyFile.get(), nullptr, RefusePemPassword, nullptr));
-  int result = kErrKeyMismatch;
+  EvpPkeyPtr key(keyFile ? PEM_read_PrivateKey(keyFile.get(), nullptr, RefusePemPassword, nullptr)
+                         : nullptr);
+  ERR_clear_error();
   if (key && EVP_PKEY_get_base_id(key.get()) == EVP_PKEY_DSA) {
     ORVA_LOG("Not Support DSA certificate anymore");
-    result = kErrDsaKey;
-  } else if (certificate && key &&
-             X509_check_private_key(certificate.get(), key.get()) == 1) {
-    result = kErrNone;
+    return kErrDsaKey;
   }
-  ERR_clear_error();  // A refused pair leaves nothing for later callers.
-  return result;
-}
-
-// True when the first certificate of `certPath` has an RSA key, the only
-// kind whose pair the openssl tool's modulus digests can compare.
-bool HasRsaCertificate(const char* certPath) {
-  FilePtr file(std::fopen(certPath, "r"));
-  if (!file) return false;
-  X509Ptr certificate(
-      PEM_read_X509(file.get(), nullptr, RefusePemPassword, nullptr));
-  ERR_clear_error();
-  return certificate &&
-         EVP_PKEY_get_base_id(X509_get0_pubkey(certificate.get())) == EVP_PKEY_RSA;
+  return proveCrtAndKey(certPath, keyPath) == 0 ? kErrNone : kErrKeyMismatch;
 }
 
 // True when the private key of `keyPath` is sound: its private part agrees
