@@ -1,5 +1,5 @@
 // EC keys wherever the device makes keys: CRT create on either side, CSR
-// create, renew keeping the curve, CSR sign, and the pair proof for any type.
+// create, renew keeping the curve, and CSR sign.
 
 #include <string>
 
@@ -10,7 +10,6 @@
 #include "tests/support/certificates.h"
 #include "tests/support/method_calls.h"
 #include "tests/support/test_support.h"
-#include "toolkit/mkcert.h"
 
 namespace {
 
@@ -55,22 +54,5 @@ TEST(EcKeys, CreateRenewAndSignKeepTheKeyAskedFor) {
                            root.Path(kGenCrtPath) + "'"));
     ASSERT_TRUE(Succeeded(CallMethod(doCertificateCreateCSR_v1, params).response));
     EXPECT_NE(std::string::npos, PemText(root.Path(kGenCsrPath)).find(c.server_key));
-  }
-}
-
-TEST(EcKeys, PairProofComparesKeysOfEveryType) {
-  TempDeviceRoot root;
-  const std::string ec = root.Path("/ec"), other = root.Path("/other"), rsa = root.Path("/rsa");
-  ASSERT_TRUE(MakeSelfSignedCa(ec + ".key", ec + ".crt", "/CN=ec", 0, KeyType::kEc));
-  ASSERT_TRUE(MakeSelfSignedCa(other + ".key", other + ".crt", "/CN=o", 0, KeyType::kEc));
-  ASSERT_TRUE(MakeSelfSignedCa(rsa + ".key", rsa + ".crt", "/CN=rsa"));
-  const struct { std::string certificate, key; int match; } cases[] = {
-      {ec + ".crt", ec + ".key", 0},   {rsa + ".crt", rsa + ".key", 0},
-      {ec + ".crt", other + ".key", 1}, {ec + ".crt", rsa + ".key", 1},
-      {rsa + ".crt", ec + ".key", 1},  {ec + ".crt", ec + ".missing", -1},
-  };
-  for (const auto& c : cases) {
-    SCOPED_TRACE(c.certificate + " " + c.key);
-    EXPECT_EQ(c.match, verifyCrtAndKeyOfAnyType(c.certificate.c_str(), c.key.c_str()));
   }
 }
