@@ -7,6 +7,7 @@
 
 inline constexpr char kOpensslTool[] = "/usr/orva/bin/openssl";
 inline constexpr char k7zTool[] = "/usr/orva/bin/7z";
+inline constexpr char kLegoTool[] = "/usr/orva/bin/lego";
 
 inline constexpr char kServerCrtPath[] = "/usr/orva/etc/ssl/ssl.crt/server.crt";
 inline constexpr char kServerKeyPath[] = "/usr/orva/etc/ssl/ssl.key/server.key";
@@ -29,5 +30,13 @@ inline constexpr char kGenKeyPath[] = "/usr/orva/etc/ssl/.gen/server.key";
 inline constexpr char kGenCsrPath[] = "/usr/orva/etc/ssl/.gen/server.csr";
 inline constexpr char kGenCrtPath[] = "/usr/orva/etc/ssl/.gen/server.crt";
 inline constexpr char kArchivePath[] = "/usr/orva/etc/ssl/.gen/archive.zip";
+
+// ACME: the settings, account and status (0700, files 0600), and the
+// webroot whose ".well-known/acme-challenge/" the front server offers over
+// HTTP; it holds a challenge token only while an order waits for it.
+inline constexpr char kAcmeDir[] = "/usr/orva/etc/ssl/acme";
+inline constexpr char kAcmeWebroot[] = "/usr/orva/etc/ssl/acme-webroot";
+inline constexpr char kAcmeChallengeDir[] =
+    "/usr/orva/etc/ssl/acme-webroot/.well-known/acme-challenge";
 
 #endif  // ORVA_COMMON_STORE_PATHS_H_

@@ -10,6 +10,7 @@
 #include <fstream>
 
 #include "common/file_util.h"
+#include "common/store_paths.h"
 
 namespace {
 
@@ -97,7 +98,7 @@ std::string TokenPath(const std::string& root) {
 }
 
 std::string AcmeChallengeFolder(const std::string& root) {
-  return root + "/usr/orva/etc/ssl/acme-challenge";
+  return root + kAcmeChallengeDir;
 }
 
 bool InitDeviceRoot(const std::string& root, std::string* error) {
@@ -110,7 +111,8 @@ bool InitDeviceRoot(const std::string& root, std::string* error) {
     if (!MakeFolder(root + directory, error)) return false;
   }
   if (!MakeFolder(AcmeChallengeFolder(root), error)) return false;
-  if (!LinkTool(root, "openssl", error) || !LinkTool(root, "7z", error)) {
+  if (!LinkTool(root, "openssl", error) || !LinkTool(root, "7z", error) ||
+      !LinkTool(root, "lego", error)) {
     return false;
   }
   if (!WriteNewFile(root + "/usr/orva/etc/orva.conf",

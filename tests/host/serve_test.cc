@@ -59,7 +59,7 @@ TEST_F(ServeTest, StartupNamesTheUrlsAndTheTokenFileAndASignalOrNginxsEndStopsBo
 TEST_F(ServeTest, EveryRequestGetsItsAnswerAtTheDoor) {
   scratch_.WriteFile("/secret.txt", "SECRET");
   scratch_.WriteFile("/web/index.html", "<html>index</html>");
-  scratch_.WriteFile("/usr/orva/etc/ssl/acme-challenge/t0k3n", "t0k3n.thumbprint");
+  scratch_.WriteFile("/usr/orva/etc/ssl/acme-webroot/.well-known/acme-challenge/t0k3n", "t0k3n.thumbprint");
   ASSERT_EQ(0, symlink(scratch_.Path("/secret.txt").c_str(), scratch_.Path("/web/leak").c_str()));
   ASSERT_EQ(0, symlink(scratch_.root().c_str(), scratch_.Path("/web/root").c_str()));
   ServeProcess server(scratch_.root(), scratch_.Path("/web"));
