@@ -8,7 +8,6 @@
 #include <cstring>
 #include <fstream>
 #include <iostream>
-#include <memory>
 #include <string>
 #include <vector>
 
@@ -17,6 +16,7 @@
 #include "host/device_root_init.h"
 #include "host/listen_address.h"
 #include "host/module_loader.h"
+#include "host/renewal_schedule.h"
 #include "host/serve_command.h"
 #include "host/temporary_uploads.h"
 
@@ -26,7 +26,8 @@ constexpr char kUsage[] =
     "usage:\n"
     "  orva-webapi init  --root DIR\n"
     "  orva-webapi call  --root DIR API METHOD [name=value ...] "
-    "[--upload NAME=PATH ...] [--output FILE]\n"
+    "[--upload NAME=PATH ...] [--output FILE] [--module PATH ...]\n"
+    "  orva-webapi renew --root DIR [--module PATH ...]\n"
     "  orva-webapi serve --root DIR [--listen HOST:PORT] "
     "[--listen-https HOST:PORT] [--web DIR] [--module PATH ...]\n";
 
@@ -53,6 +54,10 @@ struct CallArguments {
   Json::Value params{Json::objectValue};
   std::vector<std::pair<std::string, std::string>> uploads;  // name, path
   std::string output;
+  std::vector<std::string> modules;  // --module, searched first
+  // A method that no module has is told in words (the command needs it),
+  // instead of being answered 404 like a request.
+  bool needs_method = false;
 };
 
 bool SplitPair(const std::string& text, std::string* name, std::string* value) {
@@ -99,19 +104,21 @@ int RunCall(const std::string& root, const CallArguments& arguments) {
       return 1;
     }
   }
-  std::vector<std::unique_ptr<ModuleLoader>> modules;
-  ORVA::APITable table;  // the module serving the call; none answers 404
+  ModuleSet modules;
   std::string error;
-  for (const std::string& path : ModuleLoader::DefaultModulePaths()) {
-    modules.push_back(std::make_unique<ModuleLoader>());
-    if (!modules.back()->Load(path, &error)) {
-      std::fprintf(stderr, "orva-webapi: %s\n", error.c_str());
-      return 1;
-    }
-    if (FindApiRow(modules.back()->table(), arguments.api, arguments.method, 1)) {
-      table = modules.back()->table();
-    }
+  if (!modules.Load(arguments.modules, &error)) {
+    std::fprintf(stderr, "orva-webapi: %s\n", error.c_str());
+    return 1;
   }
+  const ORVA::APITable* serving =
+      FindServingTable(modules.tables(), arguments.api, arguments.method, 1);
+  if (serving == nullptr && arguments.needs_method) {
+    std::fprintf(stderr, "orva-webapi: no loaded module has the method %s %s (version 1): "
+                 "the modules are older than this host\n",
+                 arguments.api.c_str(), arguments.method.c_str());
+    return 1;
+  }
+  const ORVA::APITable table = serving != nullptr ? *serving : ORVA::APITable();
   Json::Value params = arguments.params;
   TemporaryUploads uploads;
   for (const auto& upload : arguments.uploads) {
@@ -133,6 +140,16 @@ int RunCall(const std::string& root, const CallArguments& arguments) {
   return PrintOutcome(outcome, arguments.output);
 }
 
+// `orva-webapi renew`: the renewal check that serve runs, once, as a call.
+int RunRenew(const std::string& root, const std::vector<std::string>& modules) {
+  CallArguments renew;
+  renew.api = kRenewalApi;
+  renew.method = kRenewalMethod;
+  renew.modules = modules;
+  renew.needs_method = true;
+  return RunCall(root, renew);
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
@@ -143,12 +160,12 @@ int main(int argc, char** argv) {
   ServeOptions serve;
   bool has_serve_options = false;
   bool has_call_options = false;
+  std::vector<std::string> modules;  // --module, for call, renew and serve
   std::vector<std::string> positional;
   for (int i = 2; i < argc; ++i) {
     std::string argument = argv[i];
     bool has_value = i + 1 < argc;
-    if (argument == "--listen" || argument == "--listen-https" ||
-        argument == "--web" || argument == "--module") {
+    if (argument == "--listen" || argument == "--listen-https" || argument == "--web") {
       has_serve_options = true;
     } else if (argument == "--output" || argument == "--upload") {
       has_call_options = true;
@@ -164,7 +181,7 @@ int main(int argc, char** argv) {
     } else if (argument == "--web" && has_value) {
       serve.web = argv[++i];
     } else if (argument == "--module" && has_value) {
-      serve.modules.push_back(argv[++i]);
+      modules.push_back(argv[++i]);
     } else if (argument == "--upload" && has_value) {
       std::string name, path;
       if (!SplitPair(argv[++i], &name, &path)) return Usage();
@@ -179,8 +196,10 @@ int main(int argc, char** argv) {
       (has_call_options && command != "call")) {
     return Usage();
   }
-  if (command == "init" && positional.empty()) return RunInit(root);
+  if (command == "init" && positional.empty() && modules.empty()) return RunInit(root);
+  if (command == "renew" && positional.empty() && !root.empty()) return RunRenew(root, modules);
   if (command == "call" && positional.size() >= 2 && !root.empty()) {
+    call.modules = modules;
     call.api = positional[0];
     call.method = positional[1];
     for (size_t i = 2; i < positional.size(); ++i) {
@@ -192,6 +211,7 @@ int main(int argc, char** argv) {
   }
   if (command == "serve" && positional.empty() && !root.empty()) {
     serve.root = root;
+    serve.modules = modules;
     return RunServe(serve);
   }
   return Usage();

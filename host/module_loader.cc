@@ -35,3 +35,14 @@ std::vector<std::string> ModuleLoader::DefaultModulePaths() {
   return {ExecutableDirectory() + "/ORVA.Core.Certificate.so",
           ExecutableDirectory() + "/ORVA.Core.Certificate.Extra.so"};
 }
+
+bool ModuleSet::Load(const std::vector<std::string>& named, std::string* error) {
+  std::vector<std::string> paths = named;
+  for (const std::string& path : ModuleLoader::DefaultModulePaths()) paths.push_back(path);
+  for (const std::string& path : paths) {
+    modules_.push_back(std::make_unique<ModuleLoader>());
+    if (!modules_.back()->Load(path, error)) return false;
+    tables_.push_back(modules_.back()->table());
+  }
+  return true;
+}
