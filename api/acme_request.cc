@@ -74,6 +74,9 @@ int ReadDnsSettings(ORVA::APIRequest* request, AcmeSettings* settings, AcmeSecre
     }
     secrets->dns_credentials[name] = value.asString();
   }
+  const std::string check = Text(request, "dns_propagation_check", "yes");
+  if (check != "yes" && check != "no") return Refuse("dns_propagation_check");
+  settings->dns_propagation_check = check == "yes";
   if (!ReadTexts(request->GetParam("dns_resolvers", Json::Value(Json::arrayValue)),
                  &settings->dns_resolvers) ||
       !std::all_of(settings->dns_resolvers.begin(), settings->dns_resolvers.end(), IsResolver)) {
@@ -119,7 +122,8 @@ int ReadAcmeRequest(ORVA::APIRequest* request, AcmeSettings* settings, AcmeSecre
     const int code = ReadDnsSettings(request, &read, &hidden);
     if (code != kErrNone) return code;
   } else {
-    for (const char* name : {"dns_provider", "dns_credentials", "dns_resolvers"}) {
+    for (const char* name :
+         {"dns_provider", "dns_credentials", "dns_resolvers", "dns_propagation_check"}) {
       if (!IsEmpty(request, name)) return Refuse(name);
     }
   }

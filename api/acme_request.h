@@ -11,7 +11,9 @@
 // dns_provider (a provider the client knows, not one that runs a local
 // program: "exec", "manual"), dns_credentials (a JSON object, or a text
 // holding one, of variables the provider reads to plain values),
-// dns_resolvers (JSON array of "HOST:PORT"), key_type ("ec256" default,
+// dns_resolvers (JSON array of "HOST:PORT"), dns_propagation_check ("yes",
+// the default, or "no": the client does not wait for the zone's
+// authoritative servers to answer the record), key_type ("ec256" default,
 // "ec384", "rsa2048", "rsa4096"), renew_days (1 to 3650, default 30),
 // eab_kid and eab_hmac (both or neither). The dns_ values are for dns-01;
 // with http-01 they must be absent or empty.

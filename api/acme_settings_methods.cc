@@ -28,6 +28,7 @@ Json::Value SettingsJson(const AcmeSettings& settings, const AcmeSecrets& secret
     shown["dns_credentials"].append(credential.first);
   }
   shown["dns_resolvers"] = TextArray(settings.dns_resolvers);
+  shown["dns_propagation_check"] = settings.dns_propagation_check ? "yes" : "no";
   shown["key_type"] = settings.key_type;
   shown["renew_days"] = settings.renew_days;
   shown["eab_kid"] = settings.eab_kid;

@@ -46,6 +46,7 @@ void doAcmeSet_v1(ORVA::APIRequest* request, ORVA::APIResponse* response) {
              {"dns_provider", kParameterText, false},
              {"dns_credentials", kParameterText, false},
              {"dns_resolvers", kParameterJsonArray, false},
+             {"dns_propagation_check", kParameterText, false},
              {"key_type", kParameterText, false},
              {"renew_days", kParameterWholeNumber, false},
              {"eab_kid", kParameterText, false},

@@ -80,6 +80,7 @@ int SaveAcmeSettings(const AcmeSettings& settings, const AcmeSecrets& secrets) {
   kept["challenge"] = settings.challenge;
   kept["dns_provider"] = settings.dns_provider;
   kept["dns_resolvers"] = TextArray(settings.dns_resolvers);
+  kept["dns_propagation_check"] = settings.dns_propagation_check;
   kept["key_type"] = settings.key_type;
   kept["renew_days"] = settings.renew_days;
   kept["eab_kid"] = settings.eab_kid;
@@ -112,6 +113,8 @@ int LoadAcmeSettings(AcmeSettings* settings, AcmeSecrets* secrets) {
   for (const Json::Value& resolver : kept["dns_resolvers"]) {
     loaded.dns_resolvers.push_back(TextOf(resolver));
   }
+  loaded.dns_propagation_check = !kept["dns_propagation_check"].isBool() ||
+                                  kept["dns_propagation_check"].asBool();
   loaded.key_type = TextOf(kept["key_type"]);
   loaded.renew_days = kept["renew_days"].isInt() ? kept["renew_days"].asInt() : 0;
   loaded.eab_kid = TextOf(kept["eab_kid"]);

@@ -21,6 +21,9 @@ struct AcmeSettings {
   std::string challenge;             // "http-01" or "dns-01"
   std::string dns_provider;          // the client's provider code; "" for http-01
   std::vector<std::string> dns_resolvers;  // "HOST:PORT"; empty: the system's
+  // Whether the client waits until the authoritative servers of the
+  // record's zone answer it (the client finds them by SOA queries).
+  bool dns_propagation_check = true;
   std::string key_type;              // "ec256", "ec384", "rsa2048" or "rsa4096"
   int renew_days = 30;
   std::string eab_kid;               // "" without external account binding

@@ -92,6 +92,7 @@ void BuildOrderLine(const AcmeSettings& settings, const AcmeSecrets& secrets, bo
     for (const std::string& resolver : settings.dns_resolvers) {
       line->Append(" --dns.resolvers %s", {resolver});
     }
+    if (!settings.dns_propagation_check) line->Append(" --dns.disable-cp");
   } else {
     line->Append(" --http --http.webroot %s", {OrvaPath(kAcmeWebroot)});
   }
