@@ -26,8 +26,8 @@ constexpr char kUsage[] =
     "usage:\n"
     "  orva-webapi init  --root DIR\n"
     "  orva-webapi call  --root DIR API METHOD [name=value ...] "
-    "[--upload NAME=PATH ...] [--output FILE] [--module PATH ...]\n"
-    "  orva-webapi renew --root DIR [--module PATH ...]\n"
+    "[--upload NAME=PATH ...] [--output FILE]\n"
+    "  orva-webapi renew --root DIR\n"
     "  orva-webapi serve --root DIR [--listen HOST:PORT] "
     "[--listen-https HOST:PORT] [--web DIR] [--module PATH ...]\n";
 
@@ -54,7 +54,6 @@ struct CallArguments {
   Json::Value params{Json::objectValue};
   std::vector<std::pair<std::string, std::string>> uploads;  // name, path
   std::string output;
-  std::vector<std::string> modules;  // --module, searched first
   // A method that no module has is told in words (the command needs it),
   // instead of being answered 404 like a request.
   bool needs_method = false;
@@ -106,7 +105,7 @@ int RunCall(const std::string& root, const CallArguments& arguments) {
   }
   ModuleSet modules;
   std::string error;
-  if (!modules.Load(arguments.modules, &error)) {
+  if (!modules.Load({}, &error)) {
     std::fprintf(stderr, "orva-webapi: %s\n", error.c_str());
     return 1;
   }
@@ -141,11 +140,10 @@ int RunCall(const std::string& root, const CallArguments& arguments) {
 }
 
 // `orva-webapi renew`: the renewal check that serve runs, once, as a call.
-int RunRenew(const std::string& root, const std::vector<std::string>& modules) {
+int RunRenew(const std::string& root) {
   CallArguments renew;
   renew.api = kRenewalApi;
   renew.method = kRenewalMethod;
-  renew.modules = modules;
   renew.needs_method = true;
   return RunCall(root, renew);
 }
@@ -160,12 +158,12 @@ int main(int argc, char** argv) {
   ServeOptions serve;
   bool has_serve_options = false;
   bool has_call_options = false;
-  std::vector<std::string> modules;  // --module, for call, renew and serve
   std::vector<std::string> positional;
   for (int i = 2; i < argc; ++i) {
     std::string argument = argv[i];
     bool has_value = i + 1 < argc;
-    if (argument == "--listen" || argument == "--listen-https" || argument == "--web") {
+    if (argument == "--listen" || argument == "--listen-https" ||
+        argument == "--web" || argument == "--module") {
       has_serve_options = true;
     } else if (argument == "--output" || argument == "--upload") {
       has_call_options = true;
@@ -181,7 +179,7 @@ int main(int argc, char** argv) {
     } else if (argument == "--web" && has_value) {
       serve.web = argv[++i];
     } else if (argument == "--module" && has_value) {
-      modules.push_back(argv[++i]);
+      serve.modules.push_back(argv[++i]);
     } else if (argument == "--upload" && has_value) {
       std::string name, path;
       if (!SplitPair(argv[++i], &name, &path)) return Usage();
@@ -196,10 +194,9 @@ int main(int argc, char** argv) {
       (has_call_options && command != "call")) {
     return Usage();
   }
-  if (command == "init" && positional.empty() && modules.empty()) return RunInit(root);
-  if (command == "renew" && positional.empty() && !root.empty()) return RunRenew(root, modules);
+  if (command == "init" && positional.empty()) return RunInit(root);
+  if (command == "renew" && positional.empty() && !root.empty()) return RunRenew(root);
   if (command == "call" && positional.size() >= 2 && !root.empty()) {
-    call.modules = modules;
     call.api = positional[0];
     call.method = positional[1];
     for (size_t i = 2; i < positional.size(); ++i) {
@@ -211,7 +208,6 @@ int main(int argc, char** argv) {
   }
   if (command == "serve" && positional.empty() && !root.empty()) {
     serve.root = root;
-    serve.modules = modules;
     return RunServe(serve);
   }
   return Usage();

@@ -37,8 +37,8 @@ std::vector<std::string> ModuleLoader::DefaultModulePaths() {
 }
 
 bool ModuleSet::Load(const std::vector<std::string>& named, std::string* error) {
-  std::vector<std::string> paths = named;
-  for (const std::string& path : ModuleLoader::DefaultModulePaths()) paths.push_back(path);
+  std::vector<std::string> paths = ModuleLoader::DefaultModulePaths();
+  paths.insert(paths.end(), named.begin(), named.end());
   for (const std::string& path : paths) {
     modules_.push_back(std::make_unique<ModuleLoader>());
     if (!modules_.back()->Load(path, error)) return false;

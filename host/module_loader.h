@@ -32,9 +32,8 @@ class ModuleLoader {
   ORVA::APITable table_;
 };
 
-// The modules a host command serves methods from: those named on its
-// command line first, so that their rows come before the default modules'
-// rows of the same api and method, then the default modules.
+// The modules a host command serves methods from: the default modules,
+// then those named on its command line.
 class ModuleSet {
  public:
   ModuleSet() = default;
@@ -42,7 +41,7 @@ class ModuleSet {
   ModuleSet(const ModuleSet&) = delete;
   ModuleSet& operator=(const ModuleSet&) = delete;
 
-  // Loads `named`, then ModuleLoader::DefaultModulePaths(). Returns false
+  // Loads ModuleLoader::DefaultModulePaths(), then `named`. Returns false
   // with a message in *error at the first module that does not load; the
   // ones before it stay loaded. Call once.
   bool Load(const std::vector<std::string>& named, std::string* error);

@@ -11,8 +11,8 @@ struct ServeOptions {
   ListenAddress http{"127.0.0.1", 8080};     // nginx's; port 0: any free port
   ListenAddress https{"127.0.0.1", 8443};    // nginx's, when HTTPS is on
   std::string web;  // "": "web" beside the executable, else the checkout's
-  // Web-API modules loaded before the default ones; a method is served by
-  // the first module that has it.
+  // Web-API modules loaded after the certificate module; a method is served
+  // by the first module that has it.
   std::vector<std::string> modules;
 };
 

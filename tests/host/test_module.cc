@@ -1,14 +1,10 @@
 // A web-API module for the host's tests, loaded with "serve --module". Its
 // methods do what the certificate module's cannot be made to do on demand:
-// echo, offer a download of a missing file, answer nothing, throw, ask
-// for a web server restart, and stand in for the renewal method.
+// echo, offer a download of a missing file, answer nothing, throw, and ask
+// for a web server restart.
 
-#include <unistd.h>
-
-#include <chrono>
 #include <fstream>
 #include <stdexcept>
-#include <thread>
 
 #include "platform/olib/orva_root.h"
 #include "platform/webapi/api_download.h"
@@ -41,25 +37,7 @@ void AskForRestart(ORVA::APIRequest*, ORVA::APIResponse* response) {
   response->SetSuccess(true);
 }
 
-// Stands in for the second module's renewal method (loaded first, this row
-// serves): appends "renew" to /renew.calls under the device root, holds the
-// call while /renew.hold exists (for at most 20 s), and fails while
-// /renew.fails exists.
-void Renew(ORVA::APIRequest*, ORVA::APIResponse* response) {
-  std::ofstream(OrvaPath("/renew.calls"), std::ios::app) << "renew\n";
-  const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(20);
-  while (access(OrvaPath("/renew.hold").c_str(), F_OK) == 0 &&
-         std::chrono::steady_clock::now() < deadline) {
-    std::this_thread::sleep_for(std::chrono::milliseconds(10));
-  }
-  if (access(OrvaPath("/renew.fails").c_str(), F_OK) == 0) {
-    response->SetError(5501, Json::Value());
-  } else {
-    response->SetSuccess(Json::Value(Json::objectValue));
-  }
-}
-
-constexpr int kRows = 6;
+constexpr int kRows = 5;
 // As many rows as a host reads from a module that gives no count; those
 // past kRows must never be served.
 const ORVA::APIEntry kTable[kDefaultApiTableSize] = {
@@ -67,8 +45,8 @@ const ORVA::APIEntry kTable[kDefaultApiTableSize] = {
     {"ORVA.Test", 1, "silent", AnswerNothing},
     {"ORVA.Test", 1, "throws", Throw},
     {"ORVA.Test", 1, "echo", Echo},
-    {"ORVA.Core.Certificate.ACME", 1, "renew", Renew},
     {"ORVA.Test", 1, "restart", AskForRestart},
+    {"ORVA.Test", 1, "beyond", AskForRestart},
     {"ORVA.Test", 1, "beyond", AskForRestart},
 };
 
