@@ -35,8 +35,10 @@ async function listening(port) {
   const deadline = Date.now() + 10_000;
   for (;;) {
     const socket = net.connect(port, '127.0.0.1');
-    const connected = await Promise.race([once(socket, 'connect').then(() => true),
-      once(socket, 'error').then(() => false)]);
+    const connected = await new Promise((resolve) => {
+      socket.once('connect', () => resolve(true));
+      socket.once('error', () => resolve(false));
+    });
     socket.destroy();
     if (connected) return;
     if (Date.now() > deadline) throw new Error(`nothing listens on port ${port}`);
