@@ -20,13 +20,13 @@ struct FrontSettings {
 };
 
 // The text of nginx's configuration file for `settings`. Only the page
-// folder and the ACME webroot are named by absolute path, quoted and with "$" written
-// as a variable, so no folder name can add a directive or a variable. Every
-// other file is relative: the pid file, logs and temporary folders to
-// nginx's prefix (-p), the TLS pair ("tls/server.pem", the certificate
-// followed by its chain, and "tls/server.key") to the configuration file's
-// own folder, so that a copy of the file in another folder is tested
-// against the pair beside it.
+// folder and the ACME webroot are named by absolute path, quoted and with
+// "$" written as a variable, so no folder name can add a directive or a
+// variable. Every other file is relative: the pid file, logs and temporary
+// folders to nginx's prefix (-p), the TLS pair ("tls/server.pem", the
+// certificate followed by its chain, and "tls/server.key") to the
+// configuration file's own folder, so that a copy of the file in another
+// folder is tested against the pair beside it.
 std::string FrontConfig(const FrontSettings& settings);
 
 #endif  // ORVA_HOST_FRONT_CONFIG_H_
