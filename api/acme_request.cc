@@ -21,9 +21,12 @@ int Refuse(const char* field) {
   return kErrBadParameter;
 }
 
+// The text of a parameter; `fallback` when it is absent or empty, as a
+// form sends a field left as it was.
 std::string Text(ORVA::APIRequest* request, const char* name, const char* fallback) {
   const Json::Value value = request->GetParam(name, fallback);
-  return value.isString() ? value.asString() : "";
+  const std::string text = value.isString() ? value.asString() : "";
+  return text.empty() ? fallback : text;
 }
 
 // A parameter that is absent or empty ("", [] or {}).

@@ -16,7 +16,8 @@
 // authoritative servers to answer the record), key_type ("ec256" default,
 // "ec384", "rsa2048", "rsa4096"), renew_days (1 to 3650, default 30),
 // eab_kid and eab_hmac (both or neither). The dns_ values are for dns-01;
-// with http-01 they must be absent or empty.
+// with http-01 they must be absent or empty. An empty text counts as
+// absent.
 //
 // Returns 5502 with *settings and *secrets filled; 5503 (logged, naming the
 // field that broke its rule and never a secret's value) with both

@@ -10,28 +10,13 @@
 
 namespace {
 
-Json::Value TextArray(const std::vector<std::string>& texts) {
-  Json::Value array(Json::arrayValue);
-  for (const std::string& text : texts) array.append(text);
-  return array;
-}
-
+// The kept settings with the names of the credentials, never their values.
 Json::Value SettingsJson(const AcmeSettings& settings, const AcmeSecrets& secrets) {
-  Json::Value shown(Json::objectValue);
-  shown["domains"] = TextArray(settings.domains);
-  shown["email"] = settings.email;
-  shown["directory"] = settings.directory;
-  shown["challenge"] = settings.challenge;
-  shown["dns_provider"] = settings.dns_provider;
+  Json::Value shown = AcmeSettingsJson(settings);
   shown["dns_credentials"] = Json::Value(Json::arrayValue);
   for (const auto& credential : secrets.dns_credentials) {
     shown["dns_credentials"].append(credential.first);
   }
-  shown["dns_resolvers"] = TextArray(settings.dns_resolvers);
-  shown["dns_propagation_check"] = settings.dns_propagation_check ? "yes" : "no";
-  shown["key_type"] = settings.key_type;
-  shown["renew_days"] = settings.renew_days;
-  shown["eab_kid"] = settings.eab_kid;
   return shown;
 }
 

@@ -72,7 +72,7 @@ std::string LegoOutputPath() { return AcmeFolder() + "/lego.log"; }
 
 bool MakeAcmeFolder() { return MakePrivateFolder(AcmeFolder()) && MakePrivateFolder(LegoFolder()); }
 
-int SaveAcmeSettings(const AcmeSettings& settings, const AcmeSecrets& secrets) {
+Json::Value AcmeSettingsJson(const AcmeSettings& settings) {
   Json::Value kept(Json::objectValue);
   kept["domains"] = TextArray(settings.domains);
   kept["email"] = settings.email;
@@ -80,10 +80,14 @@ int SaveAcmeSettings(const AcmeSettings& settings, const AcmeSecrets& secrets) {
   kept["challenge"] = settings.challenge;
   kept["dns_provider"] = settings.dns_provider;
   kept["dns_resolvers"] = TextArray(settings.dns_resolvers);
-  kept["dns_propagation_check"] = settings.dns_propagation_check;
+  kept["dns_propagation_check"] = settings.dns_propagation_check ? "yes" : "no";
   kept["key_type"] = settings.key_type;
   kept["renew_days"] = settings.renew_days;
   kept["eab_kid"] = settings.eab_kid;
+  return kept;
+}
+
+int SaveAcmeSettings(const AcmeSettings& settings, const AcmeSecrets& secrets) {
   Json::Value hidden(Json::objectValue);
   hidden["dns_credentials"] = Json::Value(Json::objectValue);
   for (const auto& [name, value] : secrets.dns_credentials) hidden["dns_credentials"][name] = value;
@@ -91,7 +95,8 @@ int SaveAcmeSettings(const AcmeSettings& settings, const AcmeSecrets& secrets) {
 
   if (!MakeAcmeFolder()) return -1;
   StoreFileSet set;
-  if (!WriteMember(&set, SettingsPath(), kept) || !WriteMember(&set, SecretsPath(), hidden) ||
+  if (!WriteMember(&set, SettingsPath(), AcmeSettingsJson(settings)) ||
+      !WriteMember(&set, SecretsPath(), hidden) ||
       set.Install() != 0) {
     ORVA_LOG("Save the ACME settings failed");
     return -1;
@@ -113,8 +118,7 @@ int LoadAcmeSettings(AcmeSettings* settings, AcmeSecrets* secrets) {
   for (const Json::Value& resolver : kept["dns_resolvers"]) {
     loaded.dns_resolvers.push_back(TextOf(resolver));
   }
-  loaded.dns_propagation_check = !kept["dns_propagation_check"].isBool() ||
-                                  kept["dns_propagation_check"].asBool();
+  loaded.dns_propagation_check = TextOf(kept["dns_propagation_check"]) != "no";
   loaded.key_type = TextOf(kept["key_type"]);
   loaded.renew_days = kept["renew_days"].isInt() ? kept["renew_days"].asInt() : 0;
   loaded.eab_kid = TextOf(kept["eab_kid"]);

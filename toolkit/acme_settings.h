@@ -5,6 +5,8 @@
 #include <string>
 #include <vector>
 
+#include <json/json.h>
+
 // What the device keeps for its ACME client, in the folder
 // "/usr/orva/etc/ssl/acme" (0700): the settings (settings.json), the
 // secrets apart from them (secrets.json), the last attempt (status.json),
@@ -54,6 +56,10 @@ std::string LegoOutputPath();
 // Makes the ACME folder and the client's folder (0700) when missing and
 // gives them mode 0700. False (logged) when it cannot.
 bool MakeAcmeFolder();
+
+// The settings as settings.json keeps them: an object of the members'
+// names, lists as arrays, dns_propagation_check as "yes" or "no".
+Json::Value AcmeSettingsJson(const AcmeSettings& settings);
 
 // Replaces the settings and the secrets as one set. 0 on success; -1
 // (logged) with both files as they were.

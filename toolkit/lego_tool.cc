@@ -40,9 +40,9 @@ std::string LastOutputLine() {
   ReadWholeFile(LegoOutputPath(), &output);  // An unreadable file leaves no text.
   size_t end = output.find_last_not_of(" \t\r\n");
   if (end == std::string::npos) return "";
-  const size_t start = output.rfind('\n', end);
-  std::string line = output.substr(start == std::string::npos ? 0 : start + 1,
-                                   end + 1 - (start == std::string::npos ? 0 : start + 1));
+  const size_t line_end = output.rfind('\n', end);
+  const size_t begin = line_end == std::string::npos ? 0 : line_end + 1;
+  std::string line = output.substr(begin, end + 1 - begin);
   int stamp = 0;
   if (std::sscanf(line.c_str(), "%*4d/%*2d/%*2d %*2d:%*2d:%*2d %n", &stamp) >= 0 && stamp > 0) {
     line.erase(0, static_cast<size_t>(stamp));

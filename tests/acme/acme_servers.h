@@ -25,9 +25,11 @@ class AcmeServers {
   AcmeServers& operator=(const AcmeServers&) = delete;
 
   // Starts the fake DNS and pebble, which validates http-01 challenges on
-  // `httpPort` of the names' addresses, and waits until both listen. True
-  // when they do.
+  // `httpPort` of the names' addresses, and waits up to 60 s until both
+  // answer. True when they do.
   bool Start(int httpPort);
+  // What both have written so far.
+  std::string Logs() const;
   // Kills pebble (SIGKILL) and waits for it.
   void KillPebble();
 
@@ -38,8 +40,10 @@ class AcmeServers {
   std::string Resolver() const;
 
   // A PEM text of pebble's management port ("/roots/0",
-  // "/intermediates/0"); "" when it cannot be fetched.
-  std::string Fetch(const std::string& path) const;
+  // "/intermediates/0"), or of another of its ports; "" when it cannot be
+  // fetched.
+  std::string Fetch(const std::string& path) const { return Fetch(management_port_, path); }
+  std::string Fetch(int port, const std::string& path) const;
   // POSTs the JSON `body` to the fake DNS's management `path` ("/set-txt",
   // "/add-a"...). True when it answered 200.
   bool TellDns(const std::string& path, const std::string& body) const;
