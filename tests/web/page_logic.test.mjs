@@ -106,10 +106,6 @@ const CASES = [  // kind, input, what the page answers (a RegExp: a text it matc
     directory: 'staging', custom_directory: '', challenge: 'dns-01', dns_provider: 'httpreq',
     key_type: 'ec384', renew_days: '60', credentials: ['HTTPREQ_ENDPOINT'] }],
   ['acmeDirectory', 'https://ca.lan/d', ['custom', 'https://ca.lan/d']],
-  ['acmeStatus', { settings: null, status: { time: null, result: '', error: '' } }, {
-    setup: 'Not set up: fill in the form below to get a certificate.', attempt: 'None yet.',
-    result: '', error: '', expiry: '', renewal: '',
-    issuer: 'The installed certificate did not come from an ACME authority.' }],
   ['acmeStatus', { settings: ACME_SETTINGS, status: { time: '2030-01-01T12:00:59Z', result: 'failed',
     error: 'urn:ietf:params:acme:error:connection' }, certificate: null, next_renewal: null }, {
     setup: `For *.example.com, from ${STAGING}.`, attempt: '2030-01-01 12:00\u00a0UTC',
@@ -117,19 +113,9 @@ const CASES = [  // kind, input, what the page answers (a RegExp: a text it matc
     error: 'urn:ietf:params:acme:error:connection', expiry: '',
     issuer: 'The installed certificate did not come from an ACME authority.',
     renewal: 'None: no certificate of the authority is in service.' }],
-  ['acmeStatus', { settings: ACME_SETTINGS, status: { time: '2030-01-01T12:00:00Z', result: 'success',
-    error: '' }, certificate: { issuer: 'Pebble Intermediate CA 1', valid_till: '2030-04-01T12:00:00Z',
-    days_left: 1 }, next_renewal: '2030-01-30T12:00:00Z' }, {
-    setup: `For *.example.com, from ${STAGING}.`, attempt: '2030-01-01 12:00\u00a0UTC',
-    result: 'The certificate was issued and installed.', error: '',
-    issuer: 'Pebble Intermediate CA 1', expiry: '2030-04-01 12:00\u00a0UTC (1 day left)',
-    renewal: '2030-01-30 12:00\u00a0UTC' }],
   ['domains', 'nas.example.com\n*.example.com\nxn--bcher-kva.example', ''],
   ...['nas_1.example', 'a..b', '*example.com', 'a.*.example', 'näs.example'].map((name) =>
     ['domains', `ok.example ${name}`, new RegExp(`^“${name.replace(/[.*]/g, '\\$&')}” is not a domain`)]),
-  ['sentence', [{ kind: 'module', code: 5523, data: { error: 'DNS problem: NXDOMAIN' } }, 'acme-issue'],
-    'The ACME authority did not issue the certificate. The installed certificates are unchanged. ' +
-      'Reason given: “DNS problem: NXDOMAIN”. (error 5523)'],
   ['sentence', [moduleError(5522), 'acme-issue'], /^Getting certificates from an ACME authority is not set up/],
   ['sentence', [moduleError(5503), 'acme-set'], /^A value was not accepted\. .*Nothing was saved\. \(error 5503\)$/],
 ];
