@@ -4,7 +4,6 @@
 #include "api/acme_request.h"
 #include "api/installed_server.h"
 #include "common/api_errors.h"
-#include "common/log.h"
 #include "toolkit/acme_settings.h"
 #include "toolkit/lego_tool.h"
 

@@ -2,8 +2,6 @@
 
 #include <sys/stat.h>
 
-#include <ctime>
-#include <memory>
 #include <sstream>
 
 #include <json/json.h>

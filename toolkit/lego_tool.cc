@@ -8,7 +8,6 @@
 
 #include <cctype>
 #include <cstdio>
-#include <cstring>
 
 #include "common/file_util.h"
 #include "common/log.h"

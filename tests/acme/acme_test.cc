@@ -2,8 +2,6 @@
 // pebble validating http-01 through the host's own HTTP listener and dns-01
 // through lego's httpreq provider and the fake DNS.
 
-#include <sys/stat.h>
-
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
