@@ -16,10 +16,6 @@
 
 namespace {
 
-// The longest validity Apple's clients accept for a server certificate;
-// the local CA keeps its ten years.
-constexpr int kServerValidityDays = 825;
-
 // The server request lives only while the certificate is signed, under a
 // name of its own, so a pending request of CSR create is never touched.
 class ServerRequestFile {

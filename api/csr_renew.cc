@@ -33,26 +33,6 @@ Json::Value ServerSubject(const Json::Value& info) {
   return Json::Value();
 }
 
-void FillFromSubject(const Json::Value& subject, CSR_ARGUMENT* record) {
-  if (!subject.isObject()) return;
-  const struct {
-    const char* key;
-    std::string CSR_ARGUMENT::*member;
-  } kFields[] = {
-      {"common_name", &CSR_ARGUMENT::common_name},
-      {"country", &CSR_ARGUMENT::country},
-      {"email", &CSR_ARGUMENT::email},
-      {"city", &CSR_ARGUMENT::city},
-      {"organization", &CSR_ARGUMENT::organization},
-      {"department", &CSR_ARGUMENT::department},
-      {"state", &CSR_ARGUMENT::state},
-  };
-  for (const auto& field : kFields) {
-    const Json::Value& value = subject[field.key];
-    if (!value.isNull()) record->*field.member = value.asString();
-  }
-}
-
 // The key to renew the installed server certificate with: the type of its
 // first certificate's key, RSA at its modulus size raised to the smallest
 // size keys are made with, EC on P-384 for a curve of 384 bits or more and
@@ -98,7 +78,7 @@ void handleRenewAction(ORVA::APIRequest* request, ORVA::APIResponse* response) {
     return;
   }
   CSR_ARGUMENT record;
-  FillFromSubject(ServerSubject(info), &record);
+  FillFromSubjectJson(ServerSubject(info), &record);
   KeyKind kind;
   if (!InstalledKeyKind(&kind)) {
     ORVA_LOG_LASTERR("Getting key length from %s failed", kServerCrtPath);

@@ -42,3 +42,23 @@ int fillCSRInfo(ORVA::APIRequest* request, CSR_ARGUMENT* record, bool ca) {
   }
   return 0;
 }
+
+void FillFromSubjectJson(const Json::Value& subject, CSR_ARGUMENT* record) {
+  if (!subject.isObject()) return;
+  const struct {
+    const char* key;
+    std::string CSR_ARGUMENT::*member;
+  } kFields[] = {
+      {"common_name", &CSR_ARGUMENT::common_name},
+      {"country", &CSR_ARGUMENT::country},
+      {"email", &CSR_ARGUMENT::email},
+      {"city", &CSR_ARGUMENT::city},
+      {"organization", &CSR_ARGUMENT::organization},
+      {"department", &CSR_ARGUMENT::department},
+      {"state", &CSR_ARGUMENT::state},
+  };
+  for (const auto& field : kFields) {
+    const Json::Value& value = subject[field.key];
+    if (!value.isNull()) record->*field.member = value.asString();
+  }
+}

@@ -19,6 +19,8 @@ enum ApiError {
   // The second module's codes.
   kErrBundlePassword = 5520,      // the bundle's password is wrong or missing
   kErrBundleNoPair = 5521,        // the bundle holds no key, or no certificate of its key
+  kErrAcmeNotSet = 5522,          // ACME is not set up
+  kErrAcmeOrder = 5523,           // the ACME order failed; data {"error": TEXT}
 };
 
 #endif  // ORVA_COMMON_API_ERRORS_H_

@@ -129,6 +129,23 @@ std::vector<std::string> VisibleEntries(const std::string& path) {
   return names;
 }
 
+bool RemoveFolderEntries(const std::string& path) {
+  DirPtr directory(opendir(path.c_str()));
+  if (!directory) return errno == ENOENT;
+  bool removed = true;
+  int error = 0;
+  while (struct dirent* entry = readdir(directory.get())) {
+    const std::string name = entry->d_name;
+    if (name == "." || name == "..") continue;
+    if (unlink((path + "/" + name).c_str()) != 0) {
+      removed = false;
+      error = errno;
+    }
+  }
+  errno = error;
+  return removed;
+}
+
 std::string FirstInterfaceMacAddress(const std::string& interfaces) {
   for (const std::string& name : VisibleEntries(interfaces)) {
     std::string base = interfaces + "/" + name;

@@ -41,6 +41,12 @@ void SyncDirectory(const std::string& path);
 // when it cannot be read.
 std::vector<std::string> VisibleEntries(const std::string& path);
 
+// Removes every entry of the folder `path` but "." and "..", hidden ones
+// included; entries that are folders themselves are not emptied. True when
+// nothing is left or the folder does not exist; false (errno set) when an
+// entry stays.
+bool RemoveFolderEntries(const std::string& path);
+
 // The device's MAC address as the machine shows it: the address of the
 // first network interface (by name) that is not a loopback interface and
 // has a 12-digit, non-zero hardware address, as 12 upper-case hex digits

@@ -8,6 +8,8 @@
 #include "platform/olib/olib_process.h"
 #include "platform/olib/orva_root.h"
 
+extern char** environ;
+
 ShellCommand::ShellCommand(size_t capacity) : buffer_(capacity > 0 ? capacity : 1, '\0') {}
 
 bool ShellCommand::Put(const char* text, size_t length) {
@@ -73,14 +75,33 @@ size_t RootedCommandSize(size_t deviceSize) {
 
 namespace {
 
-pid_t StartShell(const ShellCommand& command, int* stdoutFd) {
+pid_t StartShell(const ShellCommand& command, int* stdoutFd,
+                 const char* const* environment = environ) {
   if (!command.fits()) {
     ORVA_LOG("Command refused, it does not fit its buffer: %.200s",
              command.line());
     return -1;
   }
   const char* argv[] = {"/bin/sh", "-c", command.line(), nullptr};
-  return OLIBProcessSpawn(argv, stdoutFd);
+  return OLIBProcessSpawnWithEnvironment(argv, environment, stdoutFd);
+}
+
+// The caller's environment without the entries `extra` names, then `extra`.
+// The pointers borrow from environ and `extra`.
+std::vector<const char*> EnvironmentWith(const std::vector<std::string>& extra) {
+  std::vector<const char*> entries;
+  for (char** inherited = environ; *inherited != nullptr; ++inherited) {
+    const std::string entry = *inherited;
+    const std::string name = entry.substr(0, entry.find('=') + 1);
+    bool replaced = false;
+    for (const std::string& added : extra) {
+      replaced = replaced || added.compare(0, name.size(), name) == 0;
+    }
+    if (!replaced) entries.push_back(*inherited);
+  }
+  for (const std::string& added : extra) entries.push_back(added.c_str());
+  entries.push_back(nullptr);
+  return entries;
 }
 
 }  // namespace
@@ -89,6 +110,15 @@ int RunShellCommand(const ShellCommand& command) {
   pid_t pid = StartShell(command, nullptr);
   if (pid < 0) return -1;
   return OLIBProcessWait(pid, 0);
+}
+
+int RunShellCommandWith(const ShellCommand& command,
+                        const std::vector<std::string>& extraEnvironment,
+                        int timeoutSeconds) {
+  const std::vector<const char*> environment = EnvironmentWith(extraEnvironment);
+  pid_t pid = StartShell(command, nullptr, environment.data());
+  if (pid < 0) return -1;
+  return OLIBProcessWait(pid, timeoutSeconds);
 }
 
 ShellPipe::ShellPipe(const ShellCommand& command) {

@@ -78,6 +78,18 @@ size_t RootedCommandSize(size_t deviceSize);
 // be started.
 int RunShellCommand(const ShellCommand& command);
 
+// RunShellCommand for a tool that takes secrets from its environment and
+// may hang on the network: the command inherits the caller's environment
+// with each "NAME=value" entry of `extraEnvironment` added, replacing an
+// inherited entry of the same name, and is killed with its process group
+// after `timeoutSeconds` (> 0). The entries reach the child only: they are
+// never logged and never part of the line. Returns the wait status; -1
+// when the command did not fit (logged), could not start, or ran out of
+// time (the system library's last error then OLIB_ERR_TIMEOUT).
+int RunShellCommandWith(const ShellCommand& command,
+                        const std::vector<std::string>& extraEnvironment,
+                        int timeoutSeconds);
+
 // A running command whose standard output is read through stream(). The
 // destructor closes the stream and waits for the command.
 class ShellPipe {

@@ -51,6 +51,15 @@ const ORVA::APIEntry* FindApiRow(const ORVA::APITable& table,
   return nullptr;
 }
 
+const ORVA::APITable* FindServingTable(const std::vector<ORVA::APITable>& tables,
+                                       const std::string& api,
+                                       const std::string& method, int version) {
+  for (const ORVA::APITable& table : tables) {
+    if (FindApiRow(table, api, method, version) != nullptr) return &table;
+  }
+  return nullptr;
+}
+
 CallOutcome CallApi(const ORVA::APITable& table, const std::string& api,
                     const std::string& method, int version,
                     const Json::Value& params) {

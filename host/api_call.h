@@ -30,6 +30,12 @@ const ORVA::APIEntry* FindApiRow(const ORVA::APITable& table,
                                  const std::string& api,
                                  const std::string& method, int version);
 
+// The first of `tables` with a row that serves api, version and method, or
+// null when none has one. The tables are the caller's.
+const ORVA::APITable* FindServingTable(const std::vector<ORVA::APITable>& tables,
+                                       const std::string& api,
+                                       const std::string& method, int version);
+
 // Calls the row of `table` matching api, version and method with `params`
 // (a JSON object of text values). Unknown rows answer 404; a handler that
 // throws or ends without any answer answers 500.

@@ -94,9 +94,16 @@ std::string FrontConfig(const FrontSettings& settings) {
       "frame-ancestors 'none'; base-uri 'none'; form-action 'self'\" always;\n"
       "    add_header X-Frame-Options DENY always;\n"
       "    add_header X-Content-Type-Options nosniff always;\n"
+      // An ACME authority fetches a token by its name: the token alphabet
+      // of RFC 8555 only, a file only. Nothing else there is served or
+      // listed, so a file left by another tool stays out of reach.
       "    location ^~ /.well-known/acme-challenge/ {\n"
-      "      alias " + QuotedPath(settings.acme_challenge + "/") + ";\n"
-      "      default_type text/plain;\n"
+      "      location ~ \"^/\\.well-known/acme-challenge/[A-Za-z0-9_-]+$\" {\n"
+      "        root " + QuotedPath(settings.acme_webroot) + ";\n"
+      "        try_files $uri =404;\n"
+      "        default_type text/plain;\n"
+      "      }\n"
+      "      return 404;\n"
       "    }\n"
       "    location = /webapi {\n"
       "      default_type application/json;\n"

@@ -97,18 +97,22 @@ void WebapiService::ServeWebapi(const httplib::Request& request,
     WriteHostFailure(failure, response);
     return;
   }
-  CallOutcome outcome = Dispatch(call);
-  if (outcome.httpd_restart && restart_) {
-    response->set_header(kCertificateHeader, CertificateText(restart_()));
-  }
+  const char* certificate = nullptr;
+  CallOutcome outcome = Call(call, &certificate);
+  if (certificate != nullptr) response->set_header(kCertificateHeader, certificate);
   WriteCallOutcome(outcome, response);
 }
 
+CallOutcome WebapiService::Call(const WebapiCall& call, const char** certificate) {
+  *certificate = nullptr;
+  CallOutcome outcome = Dispatch(call);
+  if (outcome.httpd_restart && restart_) *certificate = CertificateText(restart_());
+  return outcome;
+}
+
 CallOutcome WebapiService::Dispatch(const WebapiCall& call) {
-  for (const ORVA::APITable& table : tables_) {
-    if (FindApiRow(table, call.api, call.method, call.version) == nullptr) continue;
-    CallOrder::Turn turn(order_, call.api, call.method);
-    return CallApi(table, call.api, call.method, call.version, call.params);
-  }
-  return HostFailure(404);
+  const ORVA::APITable* table = FindServingTable(tables_, call.api, call.method, call.version);
+  if (table == nullptr) return HostFailure(404);
+  CallOrder::Turn turn(order_, call.api, call.method);
+  return CallApi(*table, call.api, call.method, call.version, call.params);
 }

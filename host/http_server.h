@@ -44,6 +44,13 @@ class WebapiService {
   // which must be stopped before this object goes away.
   void Install(httplib::Server* server);
 
+  // Calls `call` as a /webapi request that passed the door is called: by
+  // the first table that has its row, in its turn of the order, and, when
+  // the handler asks for a web server restart, with the restart done before
+  // returning. *certificate is then the value of kCertificateHeader, else
+  // null (it points to a constant).
+  CallOutcome Call(const WebapiCall& call, const char** certificate);
+
  private:
   httplib::Server::HandlerResponse Guard(const httplib::Request& request,
                                          httplib::Response* response) const;

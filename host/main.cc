@@ -8,7 +8,6 @@
 #include <cstring>
 #include <fstream>
 #include <iostream>
-#include <memory>
 #include <string>
 #include <vector>
 
@@ -17,6 +16,7 @@
 #include "host/device_root_init.h"
 #include "host/listen_address.h"
 #include "host/module_loader.h"
+#include "host/renewal_schedule.h"
 #include "host/serve_command.h"
 #include "host/temporary_uploads.h"
 
@@ -27,6 +27,7 @@ constexpr char kUsage[] =
     "  orva-webapi init  --root DIR\n"
     "  orva-webapi call  --root DIR API METHOD [name=value ...] "
     "[--upload NAME=PATH ...] [--output FILE]\n"
+    "  orva-webapi renew --root DIR\n"
     "  orva-webapi serve --root DIR [--listen HOST:PORT] "
     "[--listen-https HOST:PORT] [--web DIR] [--module PATH ...]\n";
 
@@ -53,6 +54,9 @@ struct CallArguments {
   Json::Value params{Json::objectValue};
   std::vector<std::pair<std::string, std::string>> uploads;  // name, path
   std::string output;
+  // A method that no module has is told in words (the command needs it),
+  // instead of being answered 404 like a request.
+  bool needs_method = false;
 };
 
 bool SplitPair(const std::string& text, std::string* name, std::string* value) {
@@ -99,19 +103,21 @@ int RunCall(const std::string& root, const CallArguments& arguments) {
       return 1;
     }
   }
-  std::vector<std::unique_ptr<ModuleLoader>> modules;
-  ORVA::APITable table;  // the module serving the call; none answers 404
+  ModuleSet modules;
   std::string error;
-  for (const std::string& path : ModuleLoader::DefaultModulePaths()) {
-    modules.push_back(std::make_unique<ModuleLoader>());
-    if (!modules.back()->Load(path, &error)) {
-      std::fprintf(stderr, "orva-webapi: %s\n", error.c_str());
-      return 1;
-    }
-    if (FindApiRow(modules.back()->table(), arguments.api, arguments.method, 1)) {
-      table = modules.back()->table();
-    }
+  if (!modules.Load({}, &error)) {
+    std::fprintf(stderr, "orva-webapi: %s\n", error.c_str());
+    return 1;
   }
+  const ORVA::APITable* serving =
+      FindServingTable(modules.tables(), arguments.api, arguments.method, 1);
+  if (serving == nullptr && arguments.needs_method) {
+    std::fprintf(stderr, "orva-webapi: no loaded module has the method %s %s (version 1): "
+                 "the modules are older than this host\n",
+                 arguments.api.c_str(), arguments.method.c_str());
+    return 1;
+  }
+  const ORVA::APITable table = serving != nullptr ? *serving : ORVA::APITable();
   Json::Value params = arguments.params;
   TemporaryUploads uploads;
   for (const auto& upload : arguments.uploads) {
@@ -131,6 +137,15 @@ int RunCall(const std::string& root, const CallArguments& arguments) {
   CallOutcome outcome =
       CallApi(table, arguments.api, arguments.method, 1, params);
   return PrintOutcome(outcome, arguments.output);
+}
+
+// `orva-webapi renew`: the renewal check that serve runs, once, as a call.
+int RunRenew(const std::string& root) {
+  CallArguments renew;
+  renew.api = kRenewalApi;
+  renew.method = kRenewalMethod;
+  renew.needs_method = true;
+  return RunCall(root, renew);
 }
 
 }  // namespace
@@ -180,6 +195,7 @@ int main(int argc, char** argv) {
     return Usage();
   }
   if (command == "init" && positional.empty()) return RunInit(root);
+  if (command == "renew" && positional.empty() && !root.empty()) return RunRenew(root);
   if (command == "call" && positional.size() >= 2 && !root.empty()) {
     call.api = positional[0];
     call.method = positional[1];

@@ -35,3 +35,14 @@ std::vector<std::string> ModuleLoader::DefaultModulePaths() {
   return {ExecutableDirectory() + "/ORVA.Core.Certificate.so",
           ExecutableDirectory() + "/ORVA.Core.Certificate.Extra.so"};
 }
+
+bool ModuleSet::Load(const std::vector<std::string>& named, std::string* error) {
+  std::vector<std::string> paths = ModuleLoader::DefaultModulePaths();
+  paths.insert(paths.end(), named.begin(), named.end());
+  for (const std::string& path : paths) {
+    modules_.push_back(std::make_unique<ModuleLoader>());
+    if (!modules_.back()->Load(path, error)) return false;
+    tables_.push_back(modules_.back()->table());
+  }
+  return true;
+}

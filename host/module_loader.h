@@ -1,6 +1,7 @@
 #ifndef ORVA_HOST_MODULE_LOADER_H_
 #define ORVA_HOST_MODULE_LOADER_H_
 
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -29,6 +30,29 @@ class ModuleLoader {
  private:
   void* library_ = nullptr;
   ORVA::APITable table_;
+};
+
+// The modules a host command serves methods from: the default modules,
+// then those named on its command line.
+class ModuleSet {
+ public:
+  ModuleSet() = default;
+
+  ModuleSet(const ModuleSet&) = delete;
+  ModuleSet& operator=(const ModuleSet&) = delete;
+
+  // Loads ModuleLoader::DefaultModulePaths(), then `named`. Returns false
+  // with a message in *error at the first module that does not load; the
+  // ones before it stay loaded. Call once.
+  bool Load(const std::vector<std::string>& named, std::string* error);
+
+  // The loaded modules' tables, in search order; valid while this object
+  // lives.
+  const std::vector<ORVA::APITable>& tables() const { return tables_; }
+
+ private:
+  std::vector<std::unique_ptr<ModuleLoader>> modules_;
+  std::vector<ORVA::APITable> tables_;
 };
 
 #endif  // ORVA_HOST_MODULE_LOADER_H_

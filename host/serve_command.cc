@@ -13,12 +13,15 @@
 #include <memory>
 
 #include "common/file_util.h"
+#include "common/store_paths.h"
 #include "host/access_token.h"
 #include "host/device_root_init.h"
 #include "host/front_server.h"
 #include "host/http_server.h"
 #include "host/listener_thread.h"
 #include "host/module_loader.h"
+#include "host/renewal_schedule.h"
+#include "platform/olib/orva_root.h"
 
 namespace {
 
@@ -80,15 +83,8 @@ int RunServe(const ServeOptions& options) {
   std::string error;
   if (!token.LoadFromFile(TokenPath(root), &error)) return Fail(error + " (run init)");
 
-  std::vector<std::unique_ptr<ModuleLoader>> modules;
-  std::vector<std::string> paths = ModuleLoader::DefaultModulePaths();
-  paths.insert(paths.end(), options.modules.begin(), options.modules.end());
-  std::vector<ORVA::APITable> tables;
-  for (const std::string& path : paths) {
-    modules.push_back(std::make_unique<ModuleLoader>());
-    if (!modules.back()->Load(path, &error)) return Fail(error);
-    tables.push_back(modules.back()->table());
-  }
+  ModuleSet modules;
+  if (!modules.Load(options.modules, &error)) return Fail(error);
 
   // Every thread started from here on inherits the blocked signals, so they
   // reach only the sigwait below. Programs the host starts get a clean
@@ -108,7 +104,7 @@ int RunServe(const ServeOptions& options) {
   settings.http.port = ChosenPort(options.http);
   settings.https.port = ChosenPort(options.https);
   settings.web = WebFolder(options.web);
-  settings.acme_challenge = AcmeChallengeFolder(root);
+  settings.acme_webroot = OrvaPath(kAcmeWebroot);
   settings.max_body_bytes = WebapiService::kMaxBodyBytes;
   settings.workers_as_nobody = geteuid() == 0;
   if (settings.http.port <= 0 || settings.https.port <= 0) {
@@ -117,7 +113,7 @@ int RunServe(const ServeOptions& options) {
 
   CallOrder store_order;
   std::unique_ptr<FrontServer> front;
-  WebapiService service(std::move(tables), token, [&front] { return front->Reload(); },
+  WebapiService service(modules.tables(), token, [&front] { return front->Reload(); },
                         &store_order);
   httplib::Server backend;
   service.Install(&backend);
@@ -147,6 +143,7 @@ int RunServe(const ServeOptions& options) {
   std::printf("token: %s (send it as \"Authorization: Bearer TOKEN\" to /webapi)\n",
               TokenPath(root).c_str());
   std::fflush(stdout);
+  auto renewals = std::make_unique<RenewalSchedule>(&service);
 
   int exit_status = 0;
   for (int signal_number = 0; signal_number != SIGINT && signal_number != SIGTERM;) {
@@ -159,6 +156,7 @@ int RunServe(const ServeOptions& options) {
       break;
     }
   }
+  renewals.reset();  // before nginx goes: a renewal may still reload it
   front->Stop();
   if (exit_status == 0) {
     std::printf("orva-webapi: stopped\n");

@@ -19,8 +19,9 @@ struct ServeOptions {
 // `orva-webapi serve`: runs the web API on a listener of its own on
 // 127.0.0.1 and nginx in front of it (FrontServer), which serves the page
 // and passes /webapi on, over HTTP and, when the configuration and the
-// store allow, HTTPS, until SIGINT or SIGTERM. Prints the URLs nginx
-// listens on and the token file's path once nginx listens, and
+// store allow, HTTPS, until SIGINT or SIGTERM; renews the certificates that
+// are due at start and then regularly (RenewalSchedule). Prints the URLs
+// nginx listens on and the token file's path once nginx listens, and
 // "orva-webapi: stopped" after a clean shutdown. Returns the exit status: 0
 // after a clean shutdown; 1 when it could not start or nginx ended on its
 // own (a message says why).

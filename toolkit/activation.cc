@@ -92,8 +92,7 @@ void closePluginHandle(OLIBPLUGIN_HANDLE* handle) {
 
 void answerInstallRequest(ActivationSequence sequence, int code,
                           ORVA::APIResponse* response, const char* sourceFile,
-                          int sourceLine) {
-  Json::Value result(Json::objectValue);
+                          int sourceLine, Json::Value result) {
   result["restart_httpd"] = false;
   OrvaConf conf;
   OLIBPLUGIN_HANDLE plugin = nullptr;

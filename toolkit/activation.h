@@ -47,10 +47,12 @@ void closePluginHandle(OLIBPLUGIN_HANDLE* handle);
 
 // Ends a request that installs a server certificate. When `code` is 5502
 // (the certificate is in place) runs `sequence` and answers success with
-// the result object {"restart_httpd": bool}; otherwise answers `code` with
+// the object `result` (the caller's further answer, empty by default)
+// holding "restart_httpd": bool as well; otherwise answers `code` with
 // null data. The plug-in handle is released on both paths.
 void answerInstallRequest(ActivationSequence sequence, int code,
                           ORVA::APIResponse* response, const char* sourceFile,
-                          int sourceLine);
+                          int sourceLine,
+                          Json::Value result = Json::Value(Json::objectValue));
 
 #endif  // ORVA_TOOLKIT_ACTIVATION_H_

@@ -132,6 +132,11 @@ int genCrt(const char* extFile, const char* requestPath, const char* caOrOutput,
            const char* serialPath, const char* outputPath, const char* keyPath,
            BOOL selfSigned, int days, const char* aliases);
 
+// The validity of server certificates the local CA signs for the device
+// itself: the longest Apple's clients accept. The local CA keeps its ten
+// years.
+inline constexpr int kServerValidityDays = 825;
+
 // genCrt, CA-signed, with the server extension file
 // "/usr/orva/etc/ssl/cfg.d/server.crt.cfg" and the serial file, which
 // genSerial makes when it is absent (-1 when that fails).

@@ -22,6 +22,8 @@ mode_t ModeOf(StoreContent content) {
     case StoreContent::kImportedCertificate:
     case StoreContent::kText:
       return 0644;
+    case StoreContent::kPrivateText:
+      return 0600;
     case StoreContent::kPrivateKey:
     case StoreContent::kRequest:
     case StoreContent::kCertificate:
@@ -32,7 +34,7 @@ mode_t ModeOf(StoreContent content) {
 
 // True when the file at `path` holds a whole PEM object of `content`.
 bool HoldsWhole(const std::string& path, StoreContent content) {
-  if (content == StoreContent::kText) return true;
+  if (content == StoreContent::kText || content == StoreContent::kPrivateText) return true;
   FilePtr file(std::fopen(path.c_str(), "r"));
   if (!file) return false;
   bool whole = false;
@@ -54,6 +56,7 @@ bool HoldsWhole(const std::string& path, StoreContent content) {
                                     nullptr)) != nullptr;
       break;
     case StoreContent::kText:
+    case StoreContent::kPrivateText:
       break;
   }
   ERR_clear_error();  // A failed read is reported by the caller.

@@ -13,12 +13,14 @@
 //   kCertificate           0400   one certificate (made by the tool)
 //   kImportedCertificate   0644   a certificate (read by the TLS services)
 //   kText                  0644   anything (configuration, serial)
+//   kPrivateText           0600   anything (ACME settings, secrets, status)
 enum class StoreContent {
   kPrivateKey,
   kRequest,
   kCertificate,
   kImportedCertificate,
   kText,
+  kPrivateText,
 };
 
 // The one way store files are replaced: whole. Every member of a set is

@@ -53,6 +53,11 @@ long long MonotonicMillis() {
 }  // namespace
 
 pid_t OLIBProcessSpawn(const char* const argv[], int* stdoutFd) {
+  return OLIBProcessSpawnWithEnvironment(argv, environ, stdoutFd);
+}
+
+pid_t OLIBProcessSpawnWithEnvironment(const char* const argv[],
+                                      const char* const environment[], int* stdoutFd) {
   if (argv == nullptr || argv[0] == nullptr) {
     OLIB_SET_ERROR(OLIB_ERR_BAD_ARGUMENT);
     return -1;
@@ -94,7 +99,8 @@ pid_t OLIBProcessSpawn(const char* const argv[], int* stdoutFd) {
   pid_t pid = -1;
   if (failure == 0) {
     failure = posix_spawn(&pid, argv[0], setup.actions(), setup.attributes(),
-                          const_cast<char* const*>(argv), environ);
+                          const_cast<char* const*>(argv),
+                          const_cast<char* const*>(environment));
   }
   if (stdoutFd != nullptr) close(pipe_fds[1]);
   if (failure != 0) {

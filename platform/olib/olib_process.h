@@ -16,6 +16,12 @@
 // error set (and *stdoutFd untouched).
 pid_t OLIBProcessSpawn(const char* const argv[], int* stdoutFd);
 
+// OLIBProcessSpawn with `environment` (a null-terminated list of
+// "NAME=value" entries, borrowed for the call) as the child's whole
+// environment in place of the caller's.
+pid_t OLIBProcessSpawnWithEnvironment(const char* const argv[],
+                                      const char* const environment[], int* stdoutFd);
+
 // Waits for the child `pid`. With `timeoutSeconds` > 0, a child still
 // running after that many seconds is killed with its whole process group and
 // reaped, and the result is -1 with the last error OLIB_ERR_TIMEOUT.

@@ -21,7 +21,9 @@ Json::Value APIResponse::ToJson() const {
     answer["data"] = data_;
     return answer;
   }
-  return HostErrorJson(error_code_);
+  Json::Value answer = HostErrorJson(error_code_);
+  if (!data_.isNull()) answer["data"] = data_;
+  return answer;
 }
 
 Json::Value HostErrorJson(int code) {

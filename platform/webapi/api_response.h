@@ -30,8 +30,9 @@ class APIResponse {
   bool output_enabled() const { return output_enabled_; }
 
   // The answer as the host encodes it: {"success":true,"data":DATA} or
-  // {"success":false,"error":{"code":CODE}}. Only meaningful when the
-  // outcome is not kNone.
+  // {"success":false,"error":{"code":CODE}}, with "data":DATA beside
+  // "error" when a failure carries data. Only meaningful when the outcome
+  // is not kNone.
   Json::Value ToJson() const;
 
  private:

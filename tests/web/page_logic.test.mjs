@@ -17,6 +17,8 @@ const { aliasProblem, joinAliases } = await pageModule('aliases.js');
 const { describeError } = await pageModule('messages.js');
 const { daysLeft, formatCertificateTime, parseCertificateTime, validityState } =
   await pageModule('cert_time.js');
+const { acmeFormValues, acmeSettingsParams, acmeStatusLines, domainsProblem } =
+  await pageModule('acme.js');
 
 const NOW = new Date('2030-01-01T12:00:00Z');
 const date = (text) => (text === null ? null : new Date(text));
@@ -31,7 +33,25 @@ const ASK = {
   shown: (text) => formatCertificateTime(parseCertificateTime(text)),
   validity: ([from, until]) =>
     [until && daysLeft(date(until), NOW), validityState(date(from), date(until), NOW)],
+  acmeParams: (fields) => {
+    const values = new FormData();
+    for (const [name, value] of fields) values.append(name, value);
+    return acmeSettingsParams(values);
+  },
+  acmeForm: (settings) => acmeFormValues(settings),
+  acmeDirectory: (url) => {
+    const values = acmeFormValues({ directory: url });
+    return [values.directory, values.custom_directory];
+  },
+  acmeStatus: (data) => acmeStatusLines(data),
+  domains: (text) => domainsProblem(text),
 };
+const STAGING = 'https://acme-staging-v02.api.letsencrypt.org/directory';
+const ACME_FORM = [['domains', ' nas.example.com\n\nnas.example.com, b.example '],
+  ['email', 'admin@example.com'], ['agree_tos', 'yes'], ['key_type', 'ec256'], ['renew_days', '30']];
+const ACME_SETTINGS = { domains: ['*.example.com'], email: 'a@example.com', directory: STAGING,
+  challenge: 'dns-01', dns_provider: 'httpreq', dns_credentials: ['HTTPREQ_ENDPOINT'],
+  key_type: 'ec384', renew_days: 60 };
 
 const CASES = [  // kind, input, what the page answers (a RegExp: a text it matches)
   ['aliases', 'nas.example.com\n\n*.example.com\r\n', 'nas.example.com;*.example.com'],
@@ -70,6 +90,34 @@ const CASES = [  // kind, input, what the page answers (a RegExp: a text it matc
   ['validity', ['2029-01-01T00:00:00Z', '2030-02-01T12:00:00Z'], [31, 'valid']],
   ['validity', ['2030-02-01T00:00:00Z', '2031-01-01T00:00:00Z'], [364, 'not-yet-valid']],
   ['validity', [null, null], [null, 'unknown']],
+
+  ['acmeParams', [...ACME_FORM, ['directory', 'letsencrypt'], ['challenge', 'http-01'],
+    ['dns_provider', 'ignored'], ['credential_name', 'IGNORED'], ['credential_value', 'x']],
+  { domains: '["nas.example.com","b.example"]', email: 'admin@example.com', agree_tos: 'yes',
+    directory: 'https://acme-v02.api.letsencrypt.org/directory', challenge: 'http-01',
+    key_type: 'ec256', renew_days: '30' }],
+  ['acmeParams', [...ACME_FORM, ['directory', 'custom'], ['custom_directory', 'https://ca.lan/d'],
+    ['challenge', 'dns-01'], ['dns_provider', 'httpreq'], ['credential_name', ' HTTPREQ_ENDPOINT '],
+    ['credential_value', 'http://127.0.0.1:9/'], ['credential_name', ''], ['credential_value', 'lost']],
+  { domains: '["nas.example.com","b.example"]', email: 'admin@example.com', agree_tos: 'yes',
+    directory: 'https://ca.lan/d', challenge: 'dns-01', key_type: 'ec256', renew_days: '30',
+    dns_provider: 'httpreq', dns_credentials: '{"HTTPREQ_ENDPOINT":"http://127.0.0.1:9/"}' }],
+  ['acmeForm', ACME_SETTINGS, { domains: '*.example.com', email: 'a@example.com',
+    directory: 'staging', custom_directory: '', challenge: 'dns-01', dns_provider: 'httpreq',
+    key_type: 'ec384', renew_days: '60', credentials: ['HTTPREQ_ENDPOINT'] }],
+  ['acmeDirectory', 'https://ca.lan/d', ['custom', 'https://ca.lan/d']],
+  ['acmeStatus', { settings: ACME_SETTINGS, status: { time: '2030-01-01T12:00:59Z', result: 'failed',
+    error: 'urn:ietf:params:acme:error:connection' }, certificate: null, next_renewal: null }, {
+    setup: `For *.example.com, from ${STAGING}.`, attempt: '2030-01-01 12:00\u00a0UTC',
+    result: 'It failed; the device tries again at its next check, twice a day.',
+    error: 'urn:ietf:params:acme:error:connection', expiry: '',
+    issuer: 'The installed certificate did not come from an ACME authority.',
+    renewal: 'None: no certificate of the authority is in service.' }],
+  ['domains', 'nas.example.com\n*.example.com\nxn--bcher-kva.example', ''],
+  ...['nas_1.example', 'a..b', '*example.com', 'a.*.example', 'näs.example'].map((name) =>
+    ['domains', `ok.example ${name}`, new RegExp(`^“${name.replace(/[.*]/g, '\\$&')}” is not a domain`)]),
+  ['sentence', [moduleError(5522), 'acme-issue'], /^Getting certificates from an ACME authority is not set up/],
+  ['sentence', [moduleError(5503), 'acme-set'], /^A value was not accepted\. .*Nothing was saved\. \(error 5503\)$/],
 ];
 
 test('takes alias lists as the device does, tells each answer in words and reads times', () => {

@@ -1,12 +1,13 @@
 // Runs one action form: checks its fields, locks it while the device works
 // (so that it cannot be sent twice), and shows the outcome next to it.
 
+import { domainsProblem } from './acme.js';
 import { aliasProblem } from './aliases.js';
 import { describeError } from './messages.js';
 import { showControlProblem, showMessage } from './show_message.js';
 
 // Checks that the browser cannot make, named by a control's data-check.
-const CUSTOM_CHECKS = { aliases: aliasProblem };
+const CUSTOM_CHECKS = { aliases: aliasProblem, domains: domainsProblem };
 
 // A failure of one step of an action, told with a sentence of its own before
 // the error's (for example "The request was made, but its download failed.").
@@ -31,9 +32,11 @@ function controlProblem(control) {
   const label = labelText(control);
   const validity = control.validity;
   if (validity.valueMissing) {
+    if (control.type === 'checkbox') return `Tick “${label}” to go on.`;
     return control.type === 'file' ? `Choose a file for “${label}”.` : `Fill in “${label}”.`;
   }
   if (control.name.endsWith('country')) return `“${label}”: enter a two-letter country code, such as DE or US.`;
+  if (control.type === 'url') return `“${label}”: enter an address that starts with https://.`;
   if (validity.typeMismatch && control.type === 'email') {
     return `“${label}”: enter an e-mail address such as admin@example.com, or leave it empty.`;
   }

@@ -1,5 +1,6 @@
 // What each action form asks the device to do, and what it tells afterwards.
 
+import { ACME_API, acmeSettingsParams } from './acme.js';
 import { joinAliases } from './aliases.js';
 import { StepFailure } from './action_form.js';
 import { saveFile } from './save_file.js';
@@ -41,8 +42,9 @@ function clearFiles(form) {
 
 // `api`: the WebApi; `installed(data)`: called after a new certificate is
 // installed with the answer's data ({ restart_httpd }), returns the sentence
-// to add. Returns the run functions of the forms, by data-action.
-export function actionRuns(api, installed) {
+// to add; `acmeChanged()`: called after every ACME order, whatever its
+// outcome. Returns the run functions of the forms, by data-action.
+export function actionRuns(api, installed, acmeChanged) {
   async function downloadNow(set, context, lead) {
     return downloadFrom('ORVA.Core.Certificate', 'export', { file: set }, context, lead);
   }
@@ -67,7 +69,27 @@ export function actionRuns(api, installed) {
     };
   }
 
+  // Orders a certificate from the ACME authority now; `lead` goes before the
+  // sentence of a failure.
+  async function acmeIssued(lead) {
+    try {
+      const data = await api.call(ACME_API, 'issue');
+      return { text: `The certificate is issued and installed. ${installed(data)}` };
+    } catch (error) {
+      throw lead ? new StepFailure(error, 'acme-issue', lead) : error;
+    } finally {
+      acmeChanged();
+    }
+  }
+
   return {
+    'acme-set': async (values) => {
+      await api.call(ACME_API, 'set', acmeSettingsParams(values));
+      return acmeIssued('The settings are saved, but no certificate was issued.');
+    },
+
+    'acme-issue': async () => acmeIssued(''),
+
     'crt-create': async (values) => {
       const params = {
         ...subject(values),
@@ -162,4 +184,7 @@ export const BUSY_TEXTS = {
   'csr-sign': 'Signing the request…',
   export: 'Packing the files…',
   'export-bundle': 'Making the file…',
+  'acme-set': 'Saving the settings and asking the authority for the certificate. This can ' +
+    'take a few minutes.',
+  'acme-issue': 'Asking the authority for the certificate. This can take a few minutes.',
 };

@@ -1,6 +1,7 @@
 // Starts the page: asks for the access token when none is kept, shows the
 // installed certificates and binds the action forms.
 
+import { bindAcmeSection, refreshAcmeSection } from './acme_section.js';
 import { bindActionForm } from './action_form.js';
 import { BUSY_TEXTS, actionRuns } from './actions.js';
 import { renderCertificates } from './cert_table.js';
@@ -89,7 +90,12 @@ function installed(data) {
 buildSubjectFields(document, byId('subject-fields'));
 bindServerDaysNote(byId('csr-sign-days'), byId('csr-sign-days-note'));
 
-const runs = actionRuns(api, installed);
+const acmeSection = byId('acme');
+const acmeCredential = byId('acme-credential');
+bindAcmeSection(acmeSection, acmeCredential);
+const refreshAcme = () => refreshAcmeSection(api, acmeSection, acmeCredential);
+
+const runs = actionRuns(api, installed, refreshAcme);
 for (const form of document.querySelectorAll('form[data-action]')) {
   const action = form.dataset.action;
   bindActionForm(form, runs[action], BUSY_TEXTS[action]);
@@ -106,6 +112,10 @@ for (const link of document.querySelectorAll('[data-open-action]')) {
 }
 
 byId('refresh-table').addEventListener('click', () => refreshTable());
-byId('forget-token').addEventListener('click', () => tokens.forget().then(() => refreshTable()));
+byId('forget-token').addEventListener('click', () => tokens.forget().then(() => {
+  refreshTable();
+  refreshAcme();
+}));
 
 refreshTable();
+refreshAcme();

@@ -23,6 +23,10 @@ const MODULE_ERRORS = {
   5520: 'The password does not open the file or its key. Nothing was changed.',
   5521: 'The file holds no private key, or no certificate that belongs to its key. ' +
     'Nothing was changed.',
+  5522: 'Getting certificates from an ACME authority is not set up yet: fill in and save ' +
+    'the form “Get a certificate from an ACME authority” first.',
+  5523: 'The ACME authority did not issue the certificate. The installed certificates are ' +
+    'unchanged.',
 };
 
 // Refusals of the server itself, by HTTP status.
@@ -66,6 +70,11 @@ const CONTEXT_ERRORS = {
       'Nothing was changed.',
     5503: 'Choose a bundle file.',
   },
+  'acme-set': {
+    5503: 'A value was not accepted. Check the domain names (a wildcard “*.” needs the DNS ' +
+      'challenge), the e-mail address, that the directory is an https address, and the DNS ' +
+      'provider’s name and credentials. Nothing was saved.',
+  },
   'export-bundle': {
     5503: 'A PKCS#12 file needs a password of at least 8 characters.',
     5504: 'No server certificate with its key is installed.',
@@ -100,7 +109,10 @@ export function describeError(error, context) {
     const table = error.kind === 'module' ? MODULE_ERRORS : HOST_ERRORS;
     const sentence = CONTEXT_ERRORS[context]?.[error.code] ?? table[error.code] ??
       'The device reported an error this page does not know.';
-    return `${sentence} (error ${error.code})`;
+    // An ACME authority's own words about a failed order.
+    const reason = typeof error.data?.error === 'string' && error.data.error !== ''
+      ? ` Reason given: “${error.data.error}”.` : '';
+    return `${sentence}${reason} (error ${error.code})`;
   }
   return 'Something went wrong in this page. Reload it and try again.';
 }

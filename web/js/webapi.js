@@ -12,12 +12,14 @@ const CERTIFICATE_HEADER = 'X-Web-Certificate';
 // Why a call failed. `kind` is 'module' (the method answered an error code),
 // 'host' (the server refused the request; `code` is the HTTP status),
 // 'network' (no answer arrived) or 'answer' (an answer the page cannot read).
+// `data`: what a failed method told besides its code (null when nothing).
 export class ApiError extends Error {
-  constructor(kind, code = 0) {
+  constructor(kind, code = 0, data = null) {
     super(kind === 'network' ? 'no answer' : `error ${code}`);
     this.name = 'ApiError';
     this.kind = kind;
     this.code = code;
+    this.data = data;
   }
 }
 
@@ -43,7 +45,9 @@ async function readAnswer(response) {
   }
   if (answer !== null && answer.success === true) return answer.data ?? null;
   const code = answer?.success === false ? answer.error?.code : undefined;
-  if (Number.isInteger(code)) throw new ApiError(response.ok ? 'module' : 'host', code);
+  if (Number.isInteger(code)) {
+    throw new ApiError(response.ok ? 'module' : 'host', code, answer.data ?? null);
+  }
   if (!response.ok) throw new ApiError('host', response.status);
   throw new ApiError('answer');
 }

@@ -1,0 +1,158 @@
+// The ACME section in headless Debian Chromium against the real orva-webapi
+// and a real ACME authority on loopback (pebble, with pebble-challtestsrv as
+// its DNS, which answers 127.0.0.1 for every name): the settings form gets a
+// certificate by http-01 through the device's own HTTP listener, the status
+// panel tells it, "Renew now" orders again, and an authority that is gone is
+// told in words.
+
+import assert from 'node:assert/strict';
+import { execFile, spawn } from 'node:child_process';
+import { once } from 'node:events';
+import { chmod, mkdtemp, open, readFile, rm, writeFile } from 'node:fs/promises';
+import net from 'node:net';
+import os from 'node:os';
+import path from 'node:path';
+import { createInterface } from 'node:readline';
+import { test } from 'node:test';
+import { promisify } from 'node:util';
+
+import { chromium } from 'playwright-core';
+
+const run = promisify(execFile);
+const WAIT = { timeout: 120_000 };
+
+async function freePort() {
+  const server = net.createServer().listen(0, '127.0.0.1');
+  await once(server, 'listening');
+  const { port } = server.address();
+  server.close();
+  return port;
+}
+
+// Resolves once something accepts connections on 127.0.0.1:`port`; rejects
+// after 10 s.
+async function listening(port) {
+  const deadline = Date.now() + 10_000;
+  for (;;) {
+    const socket = net.connect(port, '127.0.0.1');
+    const connected = await new Promise((resolve) => {
+      socket.once('connect', () => resolve(true));
+      socket.once('error', () => resolve(false));
+    });
+    socket.destroy();
+    if (connected) return;
+    if (Date.now() > deadline) throw new Error(`nothing listens on port ${port}`);
+    await new Promise((resolve) => { setTimeout(resolve, 50); });
+  }
+}
+
+// Starts `command` for test `t` with `env` added, its output in the file
+// `log` (or piped when null); killed when the test ends.
+async function launch(t, command, args, log, env = {}) {
+  const output = log ? await open(log, 'w') : null;
+  const child = spawn(command, args, { env: { ...process.env, ...env },
+    stdio: ['ignore', output?.fd ?? 'pipe', output?.fd ?? 'inherit'] });
+  await output?.close();
+  t.after(async () => {
+    if (child.exitCode !== null || child.signalCode !== null) return;
+    child.kill();
+    await once(child, 'exit');
+  });
+  return child;
+}
+
+// "tone: text" of the outcome told next to `form` once the device answers.
+async function outcomeOf(form) {
+  await form.locator('button[type="submit"]').click();
+  const message = form.locator('[data-message]:is([data-tone="success"], [data-tone="error"])');
+  await message.waitFor(WAIT);
+  return `${await message.getAttribute('data-tone')}: ${await message.textContent()}`;
+}
+
+test('gets a certificate from an ACME authority, shows its status and renews it',
+  { timeout: 600_000 }, async (t) => {
+    const folder = await mkdtemp(path.join(os.tmpdir(), 'orva-acme-page-'));
+    await chmod(folder, 0o755);  // nginx's workers run as nobody when the tests run as root
+    t.after(() => rm(folder, { recursive: true, force: true }));
+    const file = (name) => path.join(folder, name);
+    await run('openssl', ['req', '-x509', '-newkey', 'ec', '-pkeyopt', 'ec_paramgen_curve:P-256',
+      '-nodes', '-days', '2', '-subj', '/CN=pebble', '-addext', 'subjectAltName=IP:127.0.0.1',
+      '-keyout', file('pebble.key'), '-out', file('pebble.crt')]);
+
+    const root = file('device');
+    await run(process.env.ORVA_WEBAPI, ['init', '--root', root]);
+    const token = (await readFile(path.join(root, 'usr/orva/etc/webapi.token'), 'utf8')).trim();
+    const server = await launch(t, process.env.ORVA_WEBAPI, ['serve', '--root', root, '--listen',
+      '127.0.0.1:0', '--listen-https', '127.0.0.1:0', '--web', process.env.ORVA_WEB_DIR], null,
+    { LEGO_CA_CERTIFICATES: file('pebble.crt') });
+    let url = null;
+    for await (const line of createInterface({ input: server.stdout })) {
+      url = /^http: +(\S+)$/.exec(line)?.[1];
+      if (url) break;
+    }
+    assert.ok(url, 'orva-webapi serve listens');
+
+    const [acme, management, dns, dnsManagement] =
+      await Promise.all([freePort(), freePort(), freePort(), freePort()]);
+    await launch(t, '/usr/bin/pebble-challtestsrv', ['-management', `127.0.0.1:${dnsManagement}`,
+      '-dns01', `127.0.0.1:${dns}`, '-defaultIPv4', '127.0.0.1', '-defaultIPv6', '',
+      '-http01', '', '-https01', '', '-tlsalpn01', ''], file('challtestsrv.log'));
+    await writeFile(file('pebble.json'), JSON.stringify({ pebble: {
+      listenAddress: `127.0.0.1:${acme}`, managementListenAddress: `127.0.0.1:${management}`,
+      certificate: file('pebble.crt'), privateKey: file('pebble.key'),
+      httpPort: Number(new URL(url).port), tlsPort: await freePort(), ocspResponderURL: '',
+      externalAccountBindingRequired: false } }));
+    const pebble = await launch(t, '/usr/bin/pebble', ['-config', file('pebble.json'),
+      '-dnsserver', `127.0.0.1:${dns}`], file('pebble.log'), { PEBBLE_VA_NOSLEEP: '1' });
+    await Promise.all([acme, dnsManagement].map(listening));
+
+    const browser = await chromium.launch({ executablePath: '/usr/bin/chromium' });
+    t.after(() => browser.close());
+    const page = await browser.newPage({ viewport: { width: 1280, height: 1000 } });
+    const consoleErrors = [];
+    page.on('pageerror', (error) => consoleErrors.push(`uncaught: ${error.message}`));
+    await page.goto(url);
+    await page.fill('#token-input', token);
+    await page.keyboard.press('Enter');
+    const line = (name) => page.locator(`#acme-status [data-line="${name}"]`);
+    const panel = async () => {
+      await page.locator('#acme-status[aria-busy="false"]').waitFor(WAIT);
+      return page.locator('#acme-status').innerText();
+    };
+    assert.match(await panel(), /Not set up: fill in the form below/);
+
+    await page.locator('#acme > details > summary').click();
+    const settings = page.locator('form[data-action="acme-set"]');
+    await page.fill('#acme-domains', 'nas.acme.test');
+    await page.fill('#acme-email', 'admin@acme.test');
+    await page.selectOption('#acme-directory', 'custom');
+    await page.fill('#acme-custom_directory', `https://127.0.0.1:${acme}/dir`);
+    assert.match(await outcomeOf(settings), /^error: Tick “I agree to the authority’s terms/);
+    await page.check('#acme-agree_tos');
+    assert.match(await outcomeOf(settings),
+      /^success: The certificate is issued and installed\. The device’s secure services/);
+    const installed = await readFile(path.join(root, 'usr/orva/etc/ssl/ssl.crt/server.crt'), 'utf8');
+    await line('issuer').filter({ hasText: 'Pebble Intermediate' }).waitFor(WAIT);
+    assert.match(await panel(), new RegExp('For nas\\.acme\\.test, from https://127\\.0\\.0\\.1:' +
+      `${acme}/dir\\.[^]*Result\\s+The certificate was issued and installed\\.[^]*` +
+      'Valid until\\s+\\d{4}-\\d\\d-\\d\\d \\d\\d:\\d\\d\\sUTC \\(\\d+ days left\\)\\s+' +
+      'Next renewal\\s+\\d{4}-\\d\\d-\\d\\d'));
+    await page.locator('#certificate-table tr[data-role="server_cert"]')
+      .filter({ hasText: 'nas.acme.test' }).waitFor(WAIT);
+    await page.screenshot({ path: path.join(process.env.ORVA_SCREENSHOTS ?? folder,
+      '09-acme-issued.png'), fullPage: true });
+
+    const renewNow = page.locator('form[data-action="acme-issue"]');
+    assert.match(await outcomeOf(renewNow), /^success: The certificate is issued and installed\./);
+    assert.notEqual(await readFile(path.join(root, 'usr/orva/etc/ssl/ssl.crt/server.crt'), 'utf8'),
+      installed, 'a new certificate is installed');
+
+    pebble.kill('SIGKILL');
+    await once(pebble, 'exit');
+    assert.match(await outcomeOf(renewNow), new RegExp('^error: The ACME authority did not issue ' +
+      'the certificate\\. The installed certificates are unchanged\\. Reason given: “.+”\\. ' +
+      '\\(error 5523\\)$'));
+    await line('result').filter({ hasText: 'It failed' }).waitFor(WAIT);
+    assert.notEqual(await line('error').textContent(), '', 'the reason is shown');
+    assert.deepEqual(consoleErrors, []);
+  });
