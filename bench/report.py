@@ -1,5 +1,7 @@
 """The one results table, as Markdown (printed and written to a file)."""
 
+import statistics
+
 from measure import ratio_interval
 
 MIB = 1024.0
@@ -138,4 +140,96 @@ def http_rows(table, http):
                   "yes" if idle < 24 * MIB and growth <= memory["tolerance_kib"] else "no"))
     table.add()
     table.add("Growth counts as none up to %d KiB (allocator pages)." % memory["tolerance_kib"])
+    table.add()
+
+
+def web_method_rows(table, rows, limit):
+    table.add("## Methods over HTTP through the running server, next to the same floors")
+    table.add()
+    table.add("POST /webapi to one `orva-webapi serve` through its nginx on loopback, with the "
+              "token, each call on a new connection; parameters as a form, uploads as a "
+              "multipart form; timed in the bench process from connecting to the answer's last "
+              "byte. These runs are interleaved with the `call` runs and the floors above, and "
+              "the floor column is the same floor series. HTTPS is off, as `init` leaves it, "
+              "so no answer waits for nginx to reload. Goal and interval as above. The `call` "
+              "column repeats the median of the same method through `orva-webapi call`, "
+              "whose process start and module loading the HTTP path does without; the list "
+              "row, which starts no tool, is what the HTTP path and the module cost alone.")
+    table.add()
+    table.add("Where the time over the floor goes, per call, as means over the runs: CPU "
+              "counted by the kernel for the host's own threads (HTTP, the form, the module's "
+              "own work), for the shells and tools the host waited for less the floor's shell "
+              "and tools, and for nginx; then, from one traced run of the method, the time "
+              "its file syncs waited for the disk (the floor makes none); the rest is time "
+              "that no process of either side spent on a core or in a sync: mostly waiting "
+              "for a core on this shared machine, at each of the programs started.")
+    table.add()
+    table.add("| Method | Sizes | Runs | Over HTTP, ms | Floor, ms | Ratio (95% CI) | Goal met "
+              "| `call`, ms | Over floor (mean) | Host CPU | Tools CPU over floor's | nginx CPU "
+              "| File syncs | Rest | Programs started, HTTP / floor |")
+    table.add("|---|---|---|---|---|---|---|---|---|---|---|---|---|---|---|")
+    for row in rows:
+        web = row.get("web")
+        if web is None or not web.wall:
+            continue
+        floor = row["floor"]
+        low, high = ratio_interval(web.wall, floor.wall)
+        verdict = _verdict(low, high, limit) if row["goal"] else "n/a (no tool)"
+        over = statistics.mean(web.wall) - statistics.mean(floor.wall)
+        host, nginx = web.part_mean("host"), web.part_mean("nginx")
+        tools = web.part_mean("tools") - statistics.mean(floor.cpu)
+        ours, theirs = row["waits"]
+        if ours is None or theirs is None:
+            syncs, rest, started = "unchecked", "–", "unchecked"
+        else:
+            sync_ms = ours["sync_ms"] - theirs["sync_ms"]
+            syncs = "%.1f (%d)" % (sync_ms, ours["syncs"])
+            rest = "%+.1f" % (over - host - tools - nginx - sync_ms)
+            # The traced method ran through `call`, one program more than over HTTP.
+            started = "%d / %d" % (ours["processes"] - 1, theirs["processes"])
+        table.add("| %s | %s | %d | %s | %s | %.2f (%.2f–%.2f) | %s | %.1f | %+.1f | %.1f "
+                  "| %+.1f | %.1f | %s | %s | %s |" % (
+                      row["name"], row["note"], len(web.wall), _ms(web), _ms(floor),
+                      web.median() / floor.median(), low, high, verdict, row["ours"].median(),
+                      over, host, tools, nginx, syncs, rest, started))
+    table.add()
+
+
+def handshake_rows(table, result):
+    table.add("## HTTPS handshakes per second")
+    table.add()
+    if result.get("failed"):
+        table.add("Not measured: %s" % result["failed"])
+        table.add()
+        return
+    table.add("One `orva-webapi serve` with HTTPS on (nginx with one worker); the RSA 2048 "
+              "set and the P-256 set, each made by CRT create, imported over HTTP in turn, "
+              "the order alternating from round to round. A round: %d `openssl s_time -new` "
+              "clients side by side for %d s, each handshake on a new TCP connection, full "
+              "(s_time -new resumes no session), no request. Rate: every client's handshakes "
+              "over the round's wall time; median of %d rounds (first–third quartile). CPU per "
+              "handshake, mean over the rounds: nginx's (the server) and the clients'; both "
+              "share the machine's cores." % (
+                  result["clients"], result["seconds"], result["rounds"]))
+    table.add()
+    table.add("| Certificate | Rounds | Handshakes/s | nginx CPU per handshake, µs "
+              "| nginx handshakes per CPU second | client CPU per handshake, µs |")
+    table.add("|---|---|---|---|---|---|")
+    for kind in result["kinds"]:
+        q = statistics.quantiles(kind.rates, n=4, method="inclusive")
+        server_us = statistics.mean(kind.server_us)
+        table.add("| %s | %d | %.0f (%.0f–%.0f) | %.0f | %.0f | %.0f |" % (
+            kind.name, len(kind.rates), statistics.median(kind.rates), q[0], q[2],
+            server_us, 1e6 / server_us, statistics.mean(kind.client_us)))
+    table.add()
+    rsa, ec = result["kinds"]
+    low, high = ratio_interval(ec.rates, rsa.rates)
+    table.add("P-256/RSA 2048 handshakes per second: %.2f (95%% interval %.2f–%.2f); "
+              "nginx CPU per handshake, RSA 2048 over P-256: %.2f." % (
+                  statistics.median(ec.rates) / statistics.median(rsa.rates), low, high,
+                  statistics.mean(rsa.server_us) / statistics.mean(ec.server_us)))
+    if min(statistics.mean(k.client_us) - statistics.mean(k.server_us) for k in (rsa, ec)) > 0:
+        table.add("Each client handshake costs more CPU than nginx's side of it, and clients "
+                  "and server share the cores: the rate is bounded by the clients as much as "
+                  "by the server, whose own cost is its CPU per handshake.")
     table.add()
