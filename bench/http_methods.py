@@ -8,9 +8,10 @@ server spent on it, by part:
     tools  the programs the host started and waited for: shells and tools
     nginx  nginx's master and workers
 
-The host's and nginx's parts are read in nanoseconds (schedstat); the tools'
-part in the kernel's clock ticks (10 ms), so only its mean over many calls
-is exact."""
+and with the time the host's and nginx's threads were ready to run but
+waited for a core ("waiting"). The host's and nginx's figures are read in
+nanoseconds (schedstat); the tools' part in the kernel's clock ticks
+(10 ms), so only its mean over many calls is exact."""
 
 import http.client
 import json
@@ -25,15 +26,18 @@ _TICK_MS = 1000.0 / os.sysconf("SC_CLK_TCK")
 
 
 def _task_ms(pid):
-    """CPU milliseconds of every thread of `pid` so far."""
-    total_ns = 0
+    """(on a core, runnable but waiting for one): the milliseconds of every
+    thread of `pid` so far."""
+    run_ns, wait_ns = 0, 0
     for task in os.listdir("/proc/%d/task" % pid):
         try:
             with open("/proc/%d/task/%s/schedstat" % (pid, task)) as stat:
-                total_ns += int(stat.read().split()[0])
+                fields = stat.read().split()
         except OSError:
-            pass  # a thread that ended meanwhile
-    return total_ns / 1e6
+            continue  # a thread that ended meanwhile
+        run_ns += int(fields[0])
+        wait_ns += int(fields[1])
+    return run_ns / 1e6, wait_ns / 1e6
 
 
 def _waited_children_ms(pid):
@@ -44,14 +48,20 @@ def _waited_children_ms(pid):
 
 
 def server_cpu_ms(server, nginx_pids):
+    """The server's CPU milliseconds so far by part (see above), and
+    "waiting": how long the host's and nginx's threads were ready to run
+    but waited for a core."""
+    host, waiting = _task_ms(server.process.pid)
     nginx = 0.0
     for pid in nginx_pids:
         try:
-            nginx += _task_ms(pid)
+            run, wait = _task_ms(pid)
         except OSError:
-            pass  # a worker that ended
-    return {"host": _task_ms(server.process.pid),
-            "tools": _waited_children_ms(server.process.pid), "nginx": nginx}
+            continue  # a worker that ended
+        nginx += run
+        waiting += wait
+    return {"host": host, "tools": _waited_children_ms(server.process.pid), "nginx": nginx,
+            "waiting": waiting}
 
 
 def multipart(fields, uploads):
@@ -118,4 +128,4 @@ def timed_call(server, request):
         raise RunFailed("HTTP %d from %s %s: %s" % (status, request.api, request.method,
                                                    body[:300].decode(errors="replace")))
     parts = {name: after[name] - before[name] for name in before}
-    return Sample(wall, sum(parts.values()), parts)
+    return Sample(wall, parts["host"] + parts["tools"] + parts["nginx"], parts)

@@ -20,6 +20,17 @@ def _verdict(low, high, limit, below=True):
     return "yes" if low >= limit else ("no" if high < limit else "undecided")
 
 
+def _section(table, title, result):
+    """Starts a section; False, after saying why, when `result` failed."""
+    table.add("## " + title)
+    table.add()
+    if result.get("failed"):
+        table.add("Not measured: %s" % result["failed"])
+        table.add()
+        return False
+    return True
+
+
 class Table:
     def __init__(self):
         self.lines = []
@@ -101,11 +112,7 @@ def peer_rows(table, keygen, easyrsa):
 
 
 def http_rows(table, http):
-    table.add("## The server over HTTP, through nginx")
-    table.add()
-    if http.get("failed"):
-        table.add("Not measured: %s" % http["failed"])
-        table.add()
+    if not _section(table, "The server over HTTP, through nginx", http):
         return
     table.add("wrk over loopback to nginx, one connection per client; each figure is the median "
               "of %d runs of %d s, the three kinds alternating. Floor: the same call without a "
@@ -159,15 +166,20 @@ def web_method_rows(table, rows, limit):
     table.add("Where the time over the floor goes, per call, as means over the runs: CPU "
               "counted by the kernel for the host's own threads (HTTP, the form, the module's "
               "own work), for the shells and tools the host waited for less the floor's shell "
-              "and tools, and for nginx; then, from one traced run of the method, the time "
-              "its file syncs waited for the disk (the floor makes none); the rest is time "
-              "that no process of either side spent on a core or in a sync: mostly waiting "
-              "for a core on this shared machine, at each of the programs started.")
+              "and tools, and for nginx; then the time the method's file syncs waited for the "
+              "disk (median of three traced runs; the floors make none); the rest is time "
+              "that no process of either side spent on a core or in a sync. Of the rest, the "
+              "time the host's and nginx's threads were ready but waited for a core is "
+              "measured; the programs' own waits for a core, at each start and hand-over, "
+              "are not measured apart. The rows that make RSA keys carry key generation's "
+              "spread from key to key (see the quartiles) in every mean, in their tools and "
+              "rest columns above all.")
     table.add()
     table.add("| Method | Sizes | Runs | Over HTTP, ms | Floor, ms | Ratio (95% CI) | Goal met "
               "| `call`, ms | Over floor (mean) | Host CPU | Tools CPU over floor's | nginx CPU "
-              "| File syncs | Rest | Programs started, HTTP / floor |")
-    table.add("|---|---|---|---|---|---|---|---|---|---|---|---|---|---|---|")
+              "| File syncs (count) | Rest | of it, host and nginx waiting for a core "
+              "| Programs started, HTTP / floor |")
+    table.add("|---|---|---|---|---|---|---|---|---|---|---|---|---|---|---|---|")
     for row in rows:
         web = row.get("web")
         if web is None or not web.wall:
@@ -188,19 +200,15 @@ def web_method_rows(table, rows, limit):
             # The traced method ran through `call`, one program more than over HTTP.
             started = "%d / %d" % (ours["processes"] - 1, theirs["processes"])
         table.add("| %s | %s | %d | %s | %s | %.2f (%.2f–%.2f) | %s | %.1f | %+.1f | %.1f "
-                  "| %+.1f | %.1f | %s | %s | %s |" % (
+                  "| %+.1f | %.1f | %s | %s | %.1f | %s |" % (
                       row["name"], row["note"], len(web.wall), _ms(web), _ms(floor),
                       web.median() / floor.median(), low, high, verdict, row["ours"].median(),
-                      over, host, tools, nginx, syncs, rest, started))
+                      over, host, tools, nginx, syncs, rest, web.part_mean("waiting"), started))
     table.add()
 
 
 def handshake_rows(table, result):
-    table.add("## HTTPS handshakes per second")
-    table.add()
-    if result.get("failed"):
-        table.add("Not measured: %s" % result["failed"])
-        table.add()
+    if not _section(table, "HTTPS handshakes per second", result):
         return
     table.add("One `orva-webapi serve` with HTTPS on (nginx with one worker); the RSA 2048 "
               "set and the P-256 set, each made by CRT create, imported over HTTP in turn, "
