@@ -13,8 +13,8 @@ class RunFailed(Exception):
 
 class Sample:
     """One timed run: wall-clock and CPU milliseconds (the process and every
-    descendant it waited for). `parts`, when known: the CPU milliseconds by
-    where they were spent, e.g. {"host": 3.1, "tools": 40.0}."""
+    descendant it waited for). `parts`, when known: milliseconds by where
+    they went, e.g. {"host": 3.1, "tools": 40.0}."""
 
     def __init__(self, wall_ms, cpu_ms, parts=None):
         self.wall_ms = wall_ms
@@ -73,7 +73,7 @@ class Series:
         return statistics.median(self.cpu) if self.cpu else None
 
     def part_mean(self, name):
-        """The mean of one CPU part: a mean, not a median, because some parts
+        """The mean of one part: a mean, not a median, because some parts
         come in whole clock ticks and only their mean is not rounded."""
         values = self.parts.get(name)
         return statistics.mean(values) if values else None

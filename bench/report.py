@@ -151,8 +151,10 @@ def http_rows(table, http):
 
 
 def web_method_rows(table, rows, limit):
-    table.add("## Methods over HTTP through the running server, next to the same floors")
-    table.add()
+    measured = {} if any("web" in row for row in rows) else {"failed": "left out"}
+    if not _section(table, "Methods over HTTP through the running server, next to the same "
+                    "floors", measured):
+        return
     table.add("POST /webapi to one `orva-webapi serve` through its nginx on loopback, with the "
               "token, each call on a new connection; parameters as a form, uploads as a "
               "multipart form; timed in the bench process from connecting to the answer's last "
@@ -167,7 +169,7 @@ def web_method_rows(table, rows, limit):
               "counted by the kernel for the host's own threads (HTTP, the form, the module's "
               "own work), for the shells and tools the host waited for less the floor's shell "
               "and tools, and for nginx; then the time the method's file syncs waited for the "
-              "disk (median of three traced runs; the floors make none); the rest is time "
+              "disk, less the floor's (median of three traced runs each); the rest is time "
               "that no process of either side spent on a core or in a sync. Of the rest, the "
               "time the host's and nginx's threads were ready but waited for a core is "
               "measured; the programs' own waits for a core, at each start and hand-over, "
@@ -181,10 +183,11 @@ def web_method_rows(table, rows, limit):
               "| Programs started, HTTP / floor |")
     table.add("|---|---|---|---|---|---|---|---|---|---|---|---|---|---|---|---|")
     for row in rows:
-        web = row.get("web")
-        if web is None or not web.wall:
+        if row.get("failed"):
+            table.add("| %s | %s | – | not measured: %s |%s" % (
+                row["name"], row["note"], row["failed"], " |" * 12))
             continue
-        floor = row["floor"]
+        web, floor = row["web"], row["floor"]
         low, high = ratio_interval(web.wall, floor.wall)
         verdict = _verdict(low, high, limit) if row["goal"] else "n/a (no tool)"
         over = statistics.mean(web.wall) - statistics.mean(floor.wall)
