@@ -169,17 +169,18 @@ def web_method_rows(table, rows, limit):
               "counted by the kernel for the host's own threads (HTTP, the form, the module's "
               "own work), for the shells and tools the host waited for less the floor's shell "
               "and tools, and for nginx; then the time the method's file syncs waited for the "
-              "disk, less the floor's (median of three traced runs each); the rest is time "
-              "that no process of either side spent on a core or in a sync. Of the rest, the "
-              "time the host's and nginx's threads were ready but waited for a core is "
-              "measured; the programs' own waits for a core, at each start and hand-over, "
-              "are not measured apart. The rows that make RSA keys carry key generation's "
-              "spread from key to key (see the quartiles) in every mean, in their tools and "
-              "rest columns above all.")
+              "disk, less the floor's (median of three traced runs each); the rest is the "
+              "time over the floor's that no process of ours spent on a core or in a sync. "
+              "Beside it, on our side alone, the time the host's and nginx's threads were "
+              "ready to run but waited for a core: the floor's programs wait too, unmeasured, "
+              "so it is no part of the rest, but the size of what the load costs the server "
+              "per call. The rows that make RSA keys carry key generation's spread from key "
+              "to key (see the quartiles) in every mean, in their tools and rest columns "
+              "above all.")
     table.add()
     table.add("| Method | Sizes | Runs | Over HTTP, ms | Floor, ms | Ratio (95% CI) | Goal met "
               "| `call`, ms | Over floor (mean) | Host CPU | Tools CPU over floor's | nginx CPU "
-              "| File syncs (count) | Rest | of it, host and nginx waiting for a core "
+              "| File syncs (count) | Rest | Host and nginx waiting for a core "
               "| Programs started, HTTP / floor |")
     table.add("|---|---|---|---|---|---|---|---|---|---|---|---|---|---|---|---|")
     for row in rows:
