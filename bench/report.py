@@ -219,28 +219,30 @@ def handshake_rows(table, result):
               "the order alternating from round to round. A round: %d `openssl s_time -new` "
               "clients side by side for %d s, each handshake on a new TCP connection, full "
               "(s_time -new resumes no session), no request. Rate: every client's handshakes "
-              "over the round's wall time; median of %d rounds (first–third quartile). CPU per "
-              "handshake, mean over the rounds: nginx's (the server) and the clients'; both "
-              "share the machine's cores." % (
+              "over the round's wall time. CPU per handshake: nginx's (the server) and the "
+              "clients'; both share the machine's cores. Each figure: the median of %d rounds "
+              "(first–third quartile)." % (
                   result["clients"], result["seconds"], result["rounds"]))
     table.add()
     table.add("| Certificate | Rounds | Handshakes/s | nginx CPU per handshake, µs "
               "| nginx handshakes per CPU second | client CPU per handshake, µs |")
     table.add("|---|---|---|---|---|---|")
+    spread = lambda values: "%.0f (%.0f–%.0f)" % ((statistics.median(values),) + tuple(
+        statistics.quantiles(values, n=4, method="inclusive")[0::2]))
     for kind in result["kinds"]:
-        q = statistics.quantiles(kind.rates, n=4, method="inclusive")
-        server_us = statistics.mean(kind.server_us)
-        table.add("| %s | %d | %.0f (%.0f–%.0f) | %.0f | %.0f | %.0f |" % (
-            kind.name, len(kind.rates), statistics.median(kind.rates), q[0], q[2],
-            server_us, 1e6 / server_us, statistics.mean(kind.client_us)))
+        table.add("| %s | %d | %s | %s | %.0f | %s |" % (
+            kind.name, len(kind.rates), spread(kind.rates), spread(kind.server_us),
+            1e6 / statistics.median(kind.server_us), spread(kind.client_us)))
     table.add()
     rsa, ec = result["kinds"]
-    low, high = ratio_interval(ec.rates, rsa.rates)
+    rate_low, rate_high = ratio_interval(ec.rates, rsa.rates)
+    cpu_low, cpu_high = ratio_interval(rsa.server_us, ec.server_us)
     table.add("P-256/RSA 2048 handshakes per second: %.2f (95%% interval %.2f–%.2f); "
-              "nginx CPU per handshake, RSA 2048 over P-256: %.2f." % (
-                  statistics.median(ec.rates) / statistics.median(rsa.rates), low, high,
-                  statistics.mean(rsa.server_us) / statistics.mean(ec.server_us)))
-    if min(statistics.mean(k.client_us) - statistics.mean(k.server_us) for k in (rsa, ec)) > 0:
+              "nginx CPU per handshake, RSA 2048 over P-256: %.2f (95%% interval %.2f–%.2f)." % (
+                  statistics.median(ec.rates) / statistics.median(rsa.rates), rate_low,
+                  rate_high, statistics.median(rsa.server_us) / statistics.median(ec.server_us),
+                  cpu_low, cpu_high))
+    if min(statistics.median(k.client_us) - statistics.median(k.server_us) for k in (rsa, ec)) > 0:
         table.add("Each client handshake costs more CPU than nginx's side of it, and clients "
                   "and server share the cores: the rate is bounded by the clients as much as "
                   "by the server, whose own cost is its CPU per handshake.")
