@@ -76,7 +76,7 @@ def one_round(server, kind, seconds):
     """CLIENTS s_time processes side by side for `seconds` (each stops at the
     first whole second after it, so they stop together)."""
     nginx_pids = server.nginx_pids()
-    nginx_before = http_methods.server_cpu_ms(server, nginx_pids)["nginx"]
+    before = http_methods.server_cpu_ms(server, nginx_pids)
     argv = ["openssl", "s_time", "-connect", "127.0.0.1:%d" % server.https_port, "-new",
             "-time", str(seconds)]
     start = time.perf_counter()
@@ -93,7 +93,8 @@ def one_round(server, kind, seconds):
         handshakes += int(match.group(1))
         client_ms += (usage.ru_utime + usage.ru_stime) * 1000.0
     wall = time.perf_counter() - start
-    nginx_ms = http_methods.server_cpu_ms(server, nginx_pids)["nginx"] - nginx_before
+    after = http_methods.server_cpu_ms(server, nginx_pids)
+    nginx_ms = http_methods.spent_ms(before, after)["nginx"]
     if handshakes == 0:
         raise RunFailed("no handshake with the %s set" % kind.name)
     kind.rates.append(handshakes / wall)

@@ -48,20 +48,29 @@ def _waited_children_ms(pid):
 
 
 def server_cpu_ms(server, nginx_pids):
-    """The server's CPU milliseconds so far by part (see above), and
-    "waiting": how long the host's and nginx's threads were ready to run
-    but waited for a core."""
-    host, waiting = _task_ms(server.process.pid)
-    nginx = 0.0
+    """One reading of the server's counters: (on a core, waiting for one) of
+    the host's threads, the CPU of the children it waited for, and (on a
+    core, waiting for one) of each nginx process still there, by pid."""
+    nginx = {}
     for pid in nginx_pids:
         try:
-            run, wait = _task_ms(pid)
+            nginx[pid] = _task_ms(pid)
         except OSError:
-            continue  # a worker that ended
-        nginx += run
-        waiting += wait
-    return {"host": host, "tools": _waited_children_ms(server.process.pid), "nginx": nginx,
-            "waiting": waiting}
+            pass  # a worker that ended
+    return {"host": _task_ms(server.process.pid),
+            "tools": _waited_children_ms(server.process.pid), "nginx": nginx}
+
+
+def spent_ms(before, after):
+    """The parts (see above) and "waiting" between two readings. An nginx
+    process counts only when both readings have it: one that ended between
+    them, as an old worker does after a reload, took its counters along."""
+    common = [pid for pid in after["nginx"] if pid in before["nginx"]]
+    nginx = [after["nginx"][pid][i] - before["nginx"][pid][i] for pid in common for i in (0, 1)]
+    return {"host": after["host"][0] - before["host"][0],
+            "tools": after["tools"] - before["tools"],
+            "nginx": sum(nginx[0::2]),
+            "waiting": after["host"][1] - before["host"][1] + sum(nginx[1::2])}
 
 
 def multipart(fields, uploads):
@@ -127,5 +136,5 @@ def timed_call(server, request):
     if not _succeeded(status, headers, body, request.download):
         raise RunFailed("HTTP %d from %s %s: %s" % (status, request.api, request.method,
                                                    body[:300].decode(errors="replace")))
-    parts = {name: after[name] - before[name] for name in before}
+    parts = spent_ms(before, after)
     return Sample(wall, parts["host"] + parts["tools"] + parts["nginx"], parts)
