@@ -169,3 +169,35 @@ def traced_tool_commands(argv, env=None):
                 if args and os.path.basename(match.group(1)) in TOOLS:
                     commands.append(_signature([match.group(1)] + args[1:]))
         return commands
+
+
+def traced_waits(argv, runs=3):
+    """What a run of argv (a method's or a floor's) starts and waits for:
+    {"processes": programs started, "syncs": file syncs (fsync, fdatasync),
+    "sync_ms": the time spent in them}, from traces of the run and all its
+    children (strace -T times each call itself, which the trace does not
+    stretch); the median of `runs` runs, as the disk's time varies with the
+    other users of the machine. None when strace is missing."""
+    strace = shutil.which("strace")
+    if strace is None:
+        return None
+    seen = []
+    for _ in range(runs):
+        with tempfile.NamedTemporaryFile(prefix="orva-bench-trace-") as trace:
+            subprocess.run([strace, "-f", "-qq", "-T", "-e", "trace=execve,fsync,fdatasync",
+                            "-o", trace.name] + argv, stdin=subprocess.DEVNULL,
+                           stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL, check=True)
+            waits = {"processes": 0, "syncs": 0, "sync_ms": 0.0}
+            with open(trace.name, errors="replace") as lines:
+                for line in lines:
+                    # A call that succeeded, ended on this line (not one left
+                    # unfinished to be resumed on a later line).
+                    if " = 0 <" not in line:
+                        continue
+                    if "execve" in line:
+                        waits["processes"] += 1
+                    elif "sync" in line:
+                        waits["syncs"] += 1
+                        waits["sync_ms"] += 1000.0 * float(line.rsplit("<", 1)[1].rstrip(">\n"))
+            seen.append(waits)
+    return sorted(seen, key=lambda waits: waits["sync_ms"])[runs // 2]

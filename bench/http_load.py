@@ -61,27 +61,36 @@ class Server:
         self.web = os.path.join(work, "web")
         os.makedirs(self.web, exist_ok=True)
         os.chmod(work, 0o755)  # nginx's workers run as nobody under root
-        self.port = _free_port()
-        self.base = "http://127.0.0.1:%d" % self.port
         with open(os.path.join(root, "usr/orva/etc/webapi.token")) as token:
             self.token = token.read().strip()
         self.log = open(os.path.join(work, "serve.log"), "wb")
-        self.process = subprocess.Popen(
-            [host, "serve", "--root", root, "--listen", "127.0.0.1:%d" % self.port,
-             "--listen-https", "127.0.0.1:%d" % _free_port(), "--web", self.web],
-            stdin=subprocess.DEVNULL, stdout=self.log, stderr=self.log)
-        self._wait_until_listening()
+        # Another program may take a chosen port before nginx binds it; serve
+        # then ends, and new ports are tried.
+        for _ in range(3):
+            self.port, self.https_port = _free_port(), _free_port()
+            self.base = "http://127.0.0.1:%d" % self.port
+            self.process = subprocess.Popen(
+                [host, "serve", "--root", root, "--listen", "127.0.0.1:%d" % self.port,
+                 "--listen-https", "127.0.0.1:%d" % self.https_port, "--web", self.web],
+                stdin=subprocess.DEVNULL, stdout=self.log, stderr=self.log)
+            if self._listening():
+                return
+        with open(self.log.name, "rb") as printed:
+            raise RunFailed("serve ended three times; last:\n%s" % printed.read()[-800:].decode(
+                errors="replace"))
 
-    def _wait_until_listening(self, seconds=15):
+    def _listening(self, seconds=15):
+        """True once serve prints its token line, which it does after nginx has
+        bound both ports (a port that merely answers may be another
+        program's); False when serve ends first."""
         deadline = time.monotonic() + seconds
         while time.monotonic() < deadline:
             if self.process.poll() is not None:
-                raise RunFailed("serve ended with %d" % self.process.returncode)
-            try:
-                socket.create_connection(("127.0.0.1", self.port), timeout=1).close()
-                return
-            except OSError:
-                time.sleep(0.05)
+                return False
+            with open(self.log.name, "rb") as printed:
+                if b"\ntoken: " in printed.read():
+                    return True
+            time.sleep(0.05)
         raise RunFailed("serve did not listen within %d s" % seconds)
 
     def fetch_list(self):
@@ -98,17 +107,27 @@ class Server:
             static.write(body)
         return self.base + "/" + STATIC_NAME
 
-    def memory_kib(self):
-        """The host and every nginx process (those in the group of its master)."""
+    def nginx_pids(self):
+        """nginx's master and workers: the processes in the group of its master."""
         pid_file = os.path.join(self.root, "usr/orva/var/webapi/nginx.pid")
         with open(pid_file) as pid:
             master = int(pid.read())
-        kib = proportional_kib(self.process.pid)
+        pids = []
         for entry in os.listdir("/proc"):
             try:
                 if entry.isdigit() and process_group(int(entry)) == master:
-                    kib += proportional_kib(int(entry))
+                    pids.append(int(entry))
             except (OSError, ValueError):
+                pass  # a process that ended meanwhile
+        return pids
+
+    def memory_kib(self):
+        """The host and every nginx process."""
+        kib = proportional_kib(self.process.pid)
+        for pid in self.nginx_pids():
+            try:
+                kib += proportional_kib(pid)
+            except OSError:
                 pass  # a process that ended meanwhile
         return kib
 

@@ -1,5 +1,6 @@
-"""The seven methods as `orva-webapi call` runs them, each with its floor, on
-a device root of their own, then CRT and CSR create with P-256 keys."""
+"""The seven methods as `orva-webapi call` runs them and as the page sends
+them over HTTP, each with its floor, on a device root of their own, then CRT
+and CSR create with P-256 keys."""
 
 import json
 import os
@@ -81,16 +82,31 @@ class Device:
         return path
 
 
+class Request:
+    """One method call as the page sends it over HTTP: `uploads` (name: path)
+    go as files of a multipart form, and stand for their own names among the
+    parameters; `download`: the answer is a file, not JSON."""
+
+    def __init__(self, api, method, params, uploads, download):
+        self.api = api
+        self.method = method
+        self.uploads = uploads or {}
+        self.params = {k: v for k, v in (params or {}).items() if k not in self.uploads}
+        self.download = download
+
+
 class Method:
     """One row of the method table. `call` and `floor` take no argument and
-    return a Sample; `argv` and `floor_argv` start one run of each side."""
+    return a Sample; `argv` and `floor_argv` start one run of each side;
+    `request` is the same call over HTTP."""
 
-    def __init__(self, name, argv, call, floor_argv, floor, goal=True, note=""):
+    def __init__(self, name, argv, call, floor_argv, floor, request, goal=True, note=""):
         self.name = name
         self.argv = argv
         self.call = call
         self.floor_argv = floor_argv
         self.floor = floor
+        self.request = request
         self.process_bound = goal
         self.note = note
 
@@ -136,7 +152,8 @@ def build(device, files, ca_bits, server_bits):
         argv = device.call_argv(api, method_name, params, uploads, output)
         call = lambda: device.call(api, method_name, params, uploads, output)
         floor_argv, floor = floor_runner(floor_name, floor_text, before_floor)
-        return Method(name, argv, call, floor_argv, floor, goal, note)
+        request = Request(api, method_name, params, uploads, output is not None)
+        return Method(name, argv, call, floor_argv, floor, request, goal, note)
 
     archive = os.path.join(device.work, "archive.zip")
     floor_archive = floor_store(".gen/archive.zip")
