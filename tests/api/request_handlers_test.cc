@@ -45,12 +45,9 @@ TEST(Refusals, LeaveTheStoreAsItWasAndActivateNothing) {
   const struct { MethodHandler method; std::string changes; int code; const char* logged; }
   cases[] = {
       {crt, R"({"email":null})", 5503, ""},
-      {crt, R"({"ca_department":null})", 5503, ""},
       {doCertificateCreateCSR_v1, R"({"email":null})", 5503, ""},
       {sign, R"({"csr":"l.csr","csr_tmp":"ROOT/outside/laptop.csr"})", 5503, ""},
       {sign, R"({"days":"TW","csr":"l.csr","csr_tmp":"ROOT/outside/laptop.csr"})", 5503, ""},
-      {sign, R"({"days":"9","csr_tmp":"ROOT/outside/laptop.csr"})", 5503, ""},
-      {import, R"({"key_tmp":"ROOT/outside/server.key"})", 5503, ""},
       {import, R"({"cert_tmp":"ROOT/outside/server.crt"})", 5503, ""},
       {doCertificateExport_v1, "{}", 5503, ""},
       {doCertificateList_v1, R"({"type":"server_cert","additional":"TW"})", 5503, ""},

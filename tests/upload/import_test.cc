@@ -1,8 +1,6 @@
 // The import of an uploaded certificate set: what it installs, and the
 // uploads it refuses with the store and the services left as they were.
 
-#include <openssl/params.h>
-#include <openssl/pem.h>
 #include <time.h>
 
 #include <map>
@@ -12,37 +10,12 @@
 #include <gtest/gtest.h>
 
 #include "api/certificate.h"
-#include "common/raii.h"
 #include "common/store_paths.h"
 #include "tests/support/certificates.h"
 #include "tests/support/method_calls.h"
 #include "tests/support/store_state.h"
 
 namespace {
-
-// Writes the RSA key of `from` to `to` with a private exponent that no
-// longer fits its public part: the modulus still matches the certificate.
-bool WriteKeyWithWrongPrivatePart(const std::string& from, const std::string& to) {
-  FilePtr in(std::fopen(from.c_str(), "r")), out(std::fopen(to.c_str(), "w"));
-  EvpPkeyPtr key(in ? PEM_read_PrivateKey(in.get(), nullptr, nullptr, nullptr) : nullptr);
-  OSSL_PARAM* params = nullptr;
-  BIGNUM* d = nullptr;
-  EVP_PKEY* wrong = nullptr;
-  EVP_PKEY_CTX* context = EVP_PKEY_CTX_new_from_name(nullptr, "RSA", nullptr);
-  OSSL_PARAM* exponent = nullptr;
-  const bool written =
-      key && out && EVP_PKEY_todata(key.get(), EVP_PKEY_KEYPAIR, &params) == 1 &&
-      (exponent = OSSL_PARAM_locate(params, "d")) != nullptr &&
-      OSSL_PARAM_get_BN(exponent, &d) == 1 && BN_add_word(d, 2) == 1 &&
-      OSSL_PARAM_set_BN(exponent, d) == 1 && EVP_PKEY_fromdata_init(context) == 1 &&
-      EVP_PKEY_fromdata(context, &wrong, EVP_PKEY_KEYPAIR, params) == 1 &&
-      PEM_write_PrivateKey(out.get(), wrong, nullptr, nullptr, 0, nullptr, nullptr) == 1;
-  EVP_PKEY_free(wrong);
-  EVP_PKEY_CTX_free(context);
-  BN_free(d);
-  OSSL_PARAM_free(params);
-  return written;
-}
 
 // A store with an old set, and uploads beside InstallOldStore's outside
 // set: the server key also in the traditional form ("BEGIN RSA PRIVATE
@@ -116,7 +89,15 @@ TEST_F(CertificateImport, RefusedUploadsLeaveTheStoreUntouchedAndActivateNothing
   ASSERT_TRUE(MakeSelfSignedCa(Outside("copy.key"), Outside("copy.crt"), "/CN=Old Root"));
   ASSERT_TRUE(MakeSignedCertificate(Outside("server.key"), Outside("server.crt"),
                                     Outside("below.key"), Outside("below.crt"), "/CN=below"));
-  ASSERT_TRUE(WriteKeyWithWrongPrivatePart(Outside("server.key"), Outside("wrong.key")));
+  // The server key with the last byte of its CRT coefficient changed: its
+  // public part still matches the certificate.
+  ASSERT_TRUE(RunForTest("cd '" + Outside("") + "' && openssl rsa -in server.key -traditional "
+                         "-outform DER -out wrong.der"));
+  std::string der = ReadFile(Outside("wrong.der"));
+  der.back() ^= 1;
+  root_.WriteFile("/outside/wrong.der", der);
+  ASSERT_TRUE(RunForTest("cd '" + Outside("") + "' && openssl rsa -inform DER -in wrong.der "
+                         "-out wrong.key"));
   const std::string crt = ReadFile(Outside("server.crt")), key = ReadFile(Outside("server.key"));
   const std::string inter = ReadFile(Outside("server-ca.crt"));
   // A PEM block of `label` whose body is no DER at all.
