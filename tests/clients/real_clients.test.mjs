@@ -81,7 +81,6 @@ const CASES = [
     reached: ['device.example', 'nas.example', '10.0.0.7'],
     listed: ['DNS:device.example', 'DNS:nas.example', 'IP:10.0.0.7', 'email:admin@device.example'],
   },
-  { what: 'CRT create, address as common name', reached: ['127.0.0.1'] },
   {
     what: 'CRT create, EC keys (P-256 server, P-384 CA)', alias: 'nas.example',
     reached: ['device.example', 'nas.example'],

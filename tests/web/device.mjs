@@ -12,13 +12,14 @@ import { promisify } from 'node:util';
 
 export const run = promisify(execFile);
 
-// A device root made by init in a new folder for test `t`. When the test
-// ends, the servers started on it stop, then the folder goes. Resolves with
+// A device root made by init in a new folder for test `t`, in a folder
+// whose name holds a quote and nginx's variable sign. When the test ends,
+// the servers started on it stop, then the folder goes. Resolves with
 // { root, folder, servers }.
 export async function newDevice(t) {
   const folder = await mkdtemp(path.join(os.tmpdir(), 'orva-device-'));
   await chmod(folder, 0o755);  // nginx's workers run as nobody when the tests run as root
-  const device = { root: path.join(folder, 'device'), folder, servers: [] };
+  const device = { root: path.join(folder, "it's $device"), folder, servers: [] };
   t.after(async () => {
     for (const server of device.servers) {
       if (server.exitCode !== null || server.signalCode !== null) continue;
