@@ -66,9 +66,6 @@ TEST_F(BundleImport, InstallsWhatTheBundleHoldsOrRefusesItWithTheStoreUntouched)
   std::vector<Case> cases = {
       {"PKCS#12 with its chain", Made(p12 + "-in server.crt -inkey server.key -certfile up.crt"),
        "secret-1", 0, true},
-      {"legacy PKCS#12 with its chain",
-       Made(p12 + "-legacy -in server.crt -inkey server.key -certfile up.crt"), "secret-1", 0,
-       true},
       {"PKCS#12 alone", Made(p12 + "-in server.crt -inkey server.key"), "secret-1", 0, false},
       {"PKCS#12, wrong password", Made(p12 + "-in server.crt -inkey server.key"), "secret-2",
        5520, false},
@@ -84,8 +81,6 @@ TEST_F(BundleImport, InstallsWhatTheBundleHoldsOrRefusesItWithTheStoreUntouched)
        Chain("server.crt") + Made(pem_key + "-traditional -aes128"), "pem-pass", 0, false},
       {"PEM with an encrypted key, wrong password",
        Made(pem_key + "-aes256") + Chain("server.crt"), "pem-wrong", 5520, false},
-      {"PEM with an encrypted key, no password",
-       Made(pem_key + "-aes256") + Chain("server.crt"), "", 5520, false},
       {"PEM with two keys", Chain("server.key") + Chain("server.crt") + Chain("inter.key"), "",
        5521, false},
       {"neither PEM nor PKCS#12", "\x30\x03\x02\x01\x00", "", 5521, false},

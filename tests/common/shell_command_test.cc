@@ -37,6 +37,13 @@ TEST(ShellCommand, LineThatDoesNotFitIsRefusedAndNeverRun) {
   EXPECT_EQ(-1, RunShellCommand(command));
   EXPECT_TRUE(log.Contains("Command refused, it does not fit its buffer")) << log.Text();
   EXPECT_FALSE(FileExists(root.Path("/ran")));
+  // A line that fits on the device fits under any root with its most paths.
+  std::string device_line = "true", rooted_line = "true";
+  for (size_t i = 0; i < kMaxRootedPaths; ++i) {
+    device_line += " /p";
+    rooted_line += " " + root.root() + "/p";
+  }
+  EXPECT_TRUE(ShellCommand(RootedCommandSize(device_line.size() + 1)).Append(rooted_line.c_str()));
 }
 
 // The test's own input holds a line, which the command must not read.

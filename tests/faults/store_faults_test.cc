@@ -43,7 +43,7 @@ struct StoreWriter {
 // The import runs openssl only to compare the pair and lets the library
 // decide when that fails.
 const std::map<std::string, StoreWriter> kWriters = {
-    {"CSR create", {doCertificateCreateCSR_v1, R"({"key_length":"2048"})", 5501, 5501}},
+    {"CSR create", {doCertificateCreateCSR_v1, R"({"key_type":"ec"})", 5501, 5501}},
     {"CSR renew", {doCertificateRenew_v1, "{}", 5501, 5501}},
     {"CSR sign",
      {doCertificateSign_v1,

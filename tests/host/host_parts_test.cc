@@ -1,4 +1,5 @@
-// The order of calls, which a running server shows only by timing.
+// Parts of the host on their own: the order of calls, which a running server
+// shows only by timing, and the blank that ends the token's scheme.
 
 #include <sys/syscall.h>
 #include <unistd.h>
@@ -13,6 +14,7 @@
 
 #include <gtest/gtest.h>
 
+#include "host/access_token.h"
 #include "host/call_order.h"
 #include "tests/host/serve_process.h"
 
@@ -86,4 +88,15 @@ TEST(CallOrder, ListNeverWaitsAndChangesStartOneAtATimeInTheOrderTheyCame) {
     EXPECT_EQ(expected, started);
   }
   for (std::thread& call : calls) call.join();
+}
+
+// The door table proves the scheme in any case and other schemes refused.
+TEST(AccessToken, TheBearerSchemeEndsInABlank) {
+  TempDeviceRoot root;
+  root.WriteFile("/token", "s3cret\n");
+  AccessToken token;
+  std::string error;
+  ASSERT_TRUE(token.LoadFromFile(root.Path("/token"), &error)) << error;
+  EXPECT_TRUE(token.Accepts("Bearer s3cret"));
+  EXPECT_FALSE(token.Accepts("Bearer_s3cret"));
 }

@@ -44,9 +44,4 @@ TEST(OrvaWebapiCommands, InitMakesAPrivateTokenOnceCallAnswersAndServeRefusesBad
       RunHost(scratch, "call " + root + " ORVA.Core.Certificate list type=server_cert");
   EXPECT_NE(std::string::npos, listed.find("\"common_name\":\"nas.local\"")) << listed;
   EXPECT_EQ(listed.size() - 8, listed.find("\nexit 0\n")) << "one line of JSON: " << listed;
-  // The second module answers beside the first.
-  const std::string pem = scratch.Path("/fullchain.pem");
-  RunHost(scratch, "call " + root + " ORVA.Core.Certificate.Bundle export format=pem --output '" +
-                       pem + "'");
-  EXPECT_EQ(ReadFile(ssl + "/ssl.crt/server.crt"), ReadFile(pem));
 }

@@ -10,11 +10,10 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <algorithm>
-#include <cctype>
 #include <chrono>
 #include <cstdio>
 #include <filesystem>
+#include <iterator>
 #include <memory>
 #include <sstream>
 #include <thread>
@@ -101,19 +100,11 @@ long ServeProcess::MemoryKib() const {
     const std::string::size_type at = rollup.find("\nPss:");
     return at == std::string::npos ? 0L : std::atol(rollup.c_str() + at + 5);
   };
-  long kib = proportional_kib(std::to_string(pid_));
-  const pid_t nginx = NginxPid();
-  std::error_code error;
-  for (const auto& process : std::filesystem::directory_iterator("/proc", error)) {
-    // nginx's processes are in the group of its master: "PID (COMM) S PPID PGRP".
-    if (!std::isdigit(process.path().filename().string()[0])) continue;
-    const std::string stat = ReadFile(process.path().string() + "/stat");
-    int group = 0;
-    if (std::sscanf(stat.c_str() + std::min(stat.size(), stat.rfind(')') + 1), " %*c %*d %d",
-                    &group) == 1 && nginx > 0 && group == nginx) {
-      kib += proportional_kib(process.path().filename().string());
-    }
-  }
+  // nginx's workers are the children of its master.
+  const std::string nginx = std::to_string(NginxPid());
+  long kib = proportional_kib(std::to_string(pid_)) + proportional_kib(nginx);
+  std::istringstream workers(ReadFile("/proc/" + nginx + "/task/" + nginx + "/children"));
+  for (std::string worker; workers >> worker;) kib += proportional_kib(worker);
   return kib;
 }
 

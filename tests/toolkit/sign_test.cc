@@ -21,7 +21,7 @@ CSR_ARGUMENT Subject() {
 }  // namespace
 
 // Each alias becomes a DNS or an IP address entry; a name that could add
-// to the extension file is refused, as are 0 days.
+// to the extension file is refused, as are 0 days. Only RSA keys encipher.
 TEST(GenServerCrt, LocalCaSignsVerifiableCertificatesNamingEachAliasAndRefusesOtherNames) {
   TempDeviceRoot root;
   CSR_ARGUMENT subject = Subject();
@@ -46,7 +46,14 @@ TEST(GenServerCrt, LocalCaSignsVerifiableCertificatesNamingEachAliasAndRefusesOt
     EXPECT_EQ(0400, FileMode(out));
     EXPECT_TRUE(RunForTest("openssl verify -CAfile '" + root.Path(kCaCrtPath) + "' '" + out + "'"));
     EXPECT_NE(std::string::npos, PemText(out).find(c.names)) << PemText(out);
+    EXPECT_NE(std::string::npos, PemText(out).find("Digital Signature, Key Encipherment\n"));
   }
+  // An EC key signs only; an RSA CA signs it.
+  ASSERT_TRUE(RunForTest("openssl req -new -newkey ec -pkeyopt ec_paramgen_curve:P-384 -nodes "
+                         "-keyout '" + root.Path("/upload/ec.key") + "' -subj /CN=nas.local "
+                         "-out '" + request + "'"));
+  ASSERT_EQ(0, sign("nas.local"));
+  EXPECT_NE(std::string::npos, PemText(out).find("Digital Signature\n")) << PemText(out);
   const std::string signed_last = ReadFile(out);
   for (const char* alias : {"a,b", "a\"b", "a\nbasicConstraints=CA:true"}) {
     SCOPED_TRACE(alias);
@@ -55,7 +62,7 @@ TEST(GenServerCrt, LocalCaSignsVerifiableCertificatesNamingEachAliasAndRefusesOt
     EXPECT_TRUE(log.Contains(" Alias 2 is neither a host name nor an IP address\n")) << log.Text();
   }
   EXPECT_EQ("0A\n", ReadFile(root.Path("/outside/serial")));
-  EXPECT_EQ("0C\n", ReadFile(serial)) << "advanced once per certificate";
+  EXPECT_EQ("0D\n", ReadFile(serial)) << "advanced once per certificate";
   EXPECT_EQ(-1, sign("", 0));
   EXPECT_EQ(signed_last, ReadFile(out));
   ExpectStoreWhole(root, {});

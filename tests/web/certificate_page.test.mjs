@@ -4,59 +4,33 @@
 // and every form, each file it uploads one that the page downloaded before.
 
 import assert from 'node:assert/strict';
-import { execFile, spawn } from 'node:child_process';
-import { once } from 'node:events';
-import { chmod, mkdtemp, readFile, rm } from 'node:fs/promises';
-import os from 'node:os';
+import { mkdtemp, readFile } from 'node:fs/promises';
 import path from 'node:path';
-import { createInterface } from 'node:readline';
 import { test } from 'node:test';
-import { promisify } from 'node:util';
 
 import { chromium } from 'playwright-core';
 
-const run = promisify(execFile);
+import { newDevice, run, serve } from './device.mjs';
+
 const WAIT = { timeout: 60_000 };
 
 // Resolves with { token, folder (scratch space), page (opened at the server),
 // consoleErrors (the page's console errors and uncaught throws) } for test
 // `t`. All goes away when the test ends, the browser before the server.
 async function openDevice(t) {
-  const folder = await mkdtemp(path.join(os.tmpdir(), 'orva-web-test-'));
-  await chmod(folder, 0o755);  // nginx's workers run as nobody when the tests run as root
   let browser = null;
-  let server = null;
-  t.after(async () => {
-    await browser?.close();
-    if (server?.exitCode === null && server.signalCode === null) {
-      server.kill();
-      await once(server, 'exit');
-    }
-    await rm(folder, { recursive: true, force: true });
-  });
-
-  const root = path.join(folder, 'device');
-  await run(process.env.ORVA_WEBAPI, ['init', '--root', root]);
-  const token = (await readFile(path.join(root, 'usr/orva/etc/webapi.token'), 'utf8')).trim();
-  await run('sed', ['-i', 's/runHTTPS="no"/runHTTPS="yes"/', path.join(root, 'usr/orva/etc/orva.conf')]);
-  server = spawn(process.env.ORVA_WEBAPI, ['serve', '--root', root, '--listen', '127.0.0.1:0',
-    '--listen-https', '127.0.0.1:0', '--web', process.env.ORVA_WEB_DIR],
-  { stdio: ['ignore', 'pipe', 'inherit'] });
-  let url = null;
-  for await (const line of createInterface({ input: server.stdout })) {
-    url = /^http: +(\S+)$/.exec(line)?.[1];
-    if (url) break;
-  }
-  if (!url) throw new Error('orva-webapi serve ended before it listened');
-
+  t.after(() => browser?.close());
+  const device = await newDevice(t);
+  const token = (await readFile(path.join(device.root, 'usr/orva/etc/webapi.token'), 'utf8')).trim();
+  const { http } = await serve(device, process.env.ORVA_WEB_DIR);
   browser = await chromium.launch({ executablePath: '/usr/bin/chromium' });
   // The locale sets the country the forms suggest.
   const page = await browser.newPage({ viewport: { width: 1280, height: 900 }, locale: 'en-GB' });
   const consoleErrors = [];
   page.on('console', (message) => message.type() === 'error' && consoleErrors.push(message.text()));
   page.on('pageerror', (error) => consoleErrors.push(`uncaught: ${error.message}`));
-  await page.goto(url);
-  return { token, folder, page, consoleErrors };
+  await page.goto(http);
+  return { token, folder: device.folder, page, consoleErrors };
 }
 
 // Saves a full-page screenshot as NAME.png in the screenshot folder, if any.
@@ -106,6 +80,8 @@ test('walks one device through the token gate, the list and every form', { timeo
     await screenshot(page, '01-token-asked');
     await signIn('not-the-device-token');
     await page.locator('#token-reason[data-tone="error"]').waitFor(WAIT);
+    await signIn('not the token');  // refused by the page itself, before any request
+    await page.locator('#token-reason', { hasText: 'without spaces.' }).waitFor(WAIT);
     assert.equal(await page.locator('#main').isVisible(), false);
     await signIn(device.token);
     assert.deepEqual(await tableRows(page), []);
@@ -116,6 +92,7 @@ test('walks one device through the token gate, the list and every form', { timeo
     await open('csr-create');
     await field('csr-create', 'country').fill('gb');
     await field('csr-create', 'common_name').fill('files.example.co.uk');
+    await field('csr-create', 'organization').fill('Files <b>&amp;</b> Co');
     await field('csr-create', 'key_length').selectOption('rsa:3072');
     const pending = await download(device, 'csr-create');
     assert.match((await run('openssl', ['req', '-in', pending('server.csr'), '-noout', '-text']))
@@ -165,7 +142,7 @@ test('walks one device through the token gate, the list and every form', { timeo
     assert.equal(await field('import', 'cert').inputValue(), '', 'the files are cleared');
     const [imported, , intermediate] = await tableRows(page, 3);
     assert.match(imported,
-      /^expiring: Server files\.example\.co\.uk Local certificate .* (19|20)Expires soon It expires /);
+      /^expiring: Server files\.example\.co\.uk Files <b>&amp;<\/b> Co Local certificate .* (19|20)Expires soon It expires /);
     assert.match(intermediate, /^valid: Intermediate Local certificate authority Self-signed/);
     await screenshot(page, '07-imported-three-rows');
     await open('export-bundle');
@@ -173,17 +150,10 @@ test('walks one device through the token gate, the list and every form', { timeo
     const [bundle, exportedBundle] = await Promise.all([
       page.waitForEvent('download', WAIT), outcomeOf(page, 'export-bundle')]);
     assert.match(`${bundle.suggestedFilename()} ${exportedBundle}`, /^server\.p12 success: /);
-    assert.match((await run('openssl', ['pkcs12', '-info', '-nodes', '-passin', 'pass:bundle-pass',
-      '-in', await bundle.path()])).stdout, /BEGIN PRIVATE KEY/);
     await open('import-bundle');
     await field('import-bundle', 'bundle').setInputFiles(await bundle.path());
-    await field('import-bundle', 'password').fill('wrong-pass');
-    assert.match(await outcomeOf(page, 'import-bundle'), /^error: .*\(error 5520\)$/);
     await field('import-bundle', 'password').fill('bundle-pass');
     assert.match(await outcomeOf(page, 'import-bundle'), /^success: /);
-    await screenshot(page, '07b-bundle-imported');
-    await page.setViewportSize({ width: 360, height: 800 });
-    await screenshot(page, '08-narrow-screen');
 
     await page.locator('#forget-token').click();
     assert.equal(await page.locator('#token-gate').isVisible(), true);
