@@ -6,19 +6,15 @@
 // told in words.
 
 import assert from 'node:assert/strict';
-import { execFile, spawn } from 'node:child_process';
+import { spawn } from 'node:child_process';
 import { once } from 'node:events';
-import { chmod, mkdtemp, open, readFile, rm, writeFile } from 'node:fs/promises';
+import { open, readFile, writeFile } from 'node:fs/promises';
 import net from 'node:net';
-import os from 'node:os';
 import path from 'node:path';
-import { createInterface } from 'node:readline';
 import { test } from 'node:test';
-import { promisify } from 'node:util';
 
-import { chromium } from 'playwright-core';
+import { chromium, newDevice, run, serve } from './device.mjs';
 
-const run = promisify(execFile);
 const WAIT = { timeout: 120_000 };
 
 async function freePort() {
@@ -47,12 +43,12 @@ async function listening(port) {
 }
 
 // Starts `command` for test `t` with `env` added, its output in the file
-// `log` (or piped when null); killed when the test ends.
+// `log`; killed when the test ends.
 async function launch(t, command, args, log, env = {}) {
-  const output = log ? await open(log, 'w') : null;
+  const output = await open(log, 'w');
   const child = spawn(command, args, { env: { ...process.env, ...env },
-    stdio: ['ignore', output?.fd ?? 'pipe', output?.fd ?? 'inherit'] });
-  await output?.close();
+    stdio: ['ignore', output.fd, output.fd] });
+  await output.close();
   t.after(async () => {
     if (child.exitCode !== null || child.signalCode !== null) return;
     child.kill();
@@ -71,26 +67,15 @@ async function outcomeOf(form) {
 
 test('gets a certificate from an ACME authority, shows its status and renews it',
   { timeout: 600_000 }, async (t) => {
-    const folder = await mkdtemp(path.join(os.tmpdir(), 'orva-acme-page-'));
-    await chmod(folder, 0o755);  // nginx's workers run as nobody when the tests run as root
-    t.after(() => rm(folder, { recursive: true, force: true }));
-    const file = (name) => path.join(folder, name);
+    const device = await newDevice(t);
+    const { root } = device;
+    const file = (name) => path.join(device.folder, name);
     await run('openssl', ['req', '-x509', '-newkey', 'ec', '-pkeyopt', 'ec_paramgen_curve:P-256',
       '-nodes', '-days', '2', '-subj', '/CN=pebble', '-addext', 'subjectAltName=IP:127.0.0.1',
       '-keyout', file('pebble.key'), '-out', file('pebble.crt')]);
-
-    const root = file('device');
-    await run(process.env.ORVA_WEBAPI, ['init', '--root', root]);
     const token = (await readFile(path.join(root, 'usr/orva/etc/webapi.token'), 'utf8')).trim();
-    const server = await launch(t, process.env.ORVA_WEBAPI, ['serve', '--root', root, '--listen',
-      '127.0.0.1:0', '--listen-https', '127.0.0.1:0', '--web', process.env.ORVA_WEB_DIR], null,
-    { LEGO_CA_CERTIFICATES: file('pebble.crt') });
-    let url = null;
-    for await (const line of createInterface({ input: server.stdout })) {
-      url = /^http: +(\S+)$/.exec(line)?.[1];
-      if (url) break;
-    }
-    assert.ok(url, 'orva-webapi serve listens');
+    process.env.LEGO_CA_CERTIFICATES = file('pebble.crt');  // for lego, which serve runs
+    const url = (await serve(device, process.env.ORVA_WEB_DIR)).http;
 
     const [acme, management, dns, dnsManagement] =
       await Promise.all([freePort(), freePort(), freePort(), freePort()]);
@@ -139,7 +124,7 @@ test('gets a certificate from an ACME authority, shows its status and renews it'
       'Next renewal\\s+\\d{4}-\\d\\d-\\d\\d'));
     await page.locator('#certificate-table tr[data-role="server_cert"]')
       .filter({ hasText: 'nas.acme.test' }).waitFor(WAIT);
-    await page.screenshot({ path: path.join(process.env.ORVA_SCREENSHOTS ?? folder,
+    await page.screenshot({ path: path.join(process.env.ORVA_SCREENSHOTS ?? device.folder,
       '09-acme-issued.png'), fullPage: true });
 
     const renewNow = page.locator('form[data-action="acme-issue"]');
