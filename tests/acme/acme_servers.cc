@@ -1,16 +1,12 @@
 #include "tests/acme/acme_servers.h"
 
 #include <arpa/inet.h>
-#include <fcntl.h>
 #include <signal.h>
-#include <sys/prctl.h>
 #include <sys/socket.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <chrono>
 #include <fstream>
-#include <vector>
 
 #include <json/json.h>
 
@@ -35,25 +31,6 @@ int FreePort() {
   return port;
 }
 
-// Starts `words` with `environment` added, its output in `log`.
-pid_t Launch(std::vector<std::string> words, const std::string& log,
-             const std::string& environment = "") {
-  if (!environment.empty()) words.insert(words.begin(), {"/usr/bin/env", environment});
-  std::vector<char*> argv;
-  for (std::string& word : words) argv.push_back(&word[0]);
-  argv.push_back(nullptr);
-  const pid_t pid = fork();
-  if (pid == 0) {
-    prctl(PR_SET_PDEATHSIG, SIGKILL);  // Never outlive a crashed test.
-    const int out = open(log.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
-    if (out >= 0 && dup2(out, STDOUT_FILENO) >= 0 && dup2(out, STDERR_FILENO) >= 0) {
-      execv(argv[0], argv.data());
-    }
-    _exit(127);
-  }
-  return pid;
-}
-
 void Kill(pid_t* pid) {
   if (*pid <= 0) return;
   kill(*pid, SIGKILL);
@@ -70,6 +47,7 @@ AcmeServers::AcmeServers(const std::string& folder)
       management_port_(FreePort()),
       dns_port_(FreePort()),
       dns_management_port_(FreePort()) {
+  MakeDirs(folder_);
   RunForTest("openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:P-256 -nodes -days 2"
              " -subj /CN=pebble -addext subjectAltName=IP:127.0.0.1,DNS:localhost -keyout '" +
              folder_ + "/pebble.key' -out '" + tls_certificate_ + "'");
@@ -82,11 +60,12 @@ AcmeServers::~AcmeServers() {
 
 bool AcmeServers::Start(int httpPort) {
   const std::string local = "127.0.0.1:";
-  dns_ = Launch({"/usr/bin/pebble-challtestsrv", "-management",
-                 local + std::to_string(dns_management_port_), "-dns01",
-                 local + std::to_string(dns_port_), "-defaultIPv4", "127.0.0.1", "-defaultIPv6",
-                 "", "-http01", "", "-https01", "", "-tlsalpn01", ""},
-                folder_ + "/challtestsrv.log");
+  const std::string dns = local + std::to_string(dns_port_);
+  const std::string dns_log = folder_ + "/challtestsrv.log";
+  dns_ = StartProcess({"/usr/bin/pebble-challtestsrv", "-management",
+                       local + std::to_string(dns_management_port_), "-dns01", dns,
+                       "-defaultIPv4", "127.0.0.1", "-defaultIPv6", "", "-http01", "",
+                       "-https01", "", "-tlsalpn01", ""}, dns_log, dns_log);
   Json::Value config;
   config["pebble"]["listenAddress"] = local + std::to_string(acme_port_);
   config["pebble"]["managementListenAddress"] = local + std::to_string(management_port_);
@@ -96,19 +75,16 @@ bool AcmeServers::Start(int httpPort) {
   config["pebble"]["tlsPort"] = FreePort();
   config["pebble"]["ocspResponderURL"] = "";
   config["pebble"]["externalAccountBindingRequired"] = false;
-  MakeDirs(folder_);
   std::ofstream(folder_ + "/pebble.json") << config;
-  pebble_ = Launch({"/usr/bin/pebble", "-config", folder_ + "/pebble.json", "-dnsserver",
-                    local + std::to_string(dns_port_)},
-                   folder_ + "/pebble.log", "PEBBLE_VA_NOSLEEP=1");
+  const std::string log = folder_ + "/pebble.log";
+  pebble_ = StartProcess({"/usr/bin/env", "PEBBLE_VA_NOSLEEP=1", "/usr/bin/pebble", "-config",
+                          folder_ + "/pebble.json", "-dnsserver", dns},
+                         log, log);
   // pebble makes its CA keys first: slow on a loaded machine.
-  const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(60);
-  while (Fetch(acme_port_, "/dir").empty() || Fetch("/roots/0").empty() ||
-         !TellDns("/clear-txt", R"({"host":"ready.test."})")) {
-    if (std::chrono::steady_clock::now() > deadline) return false;
-    std::this_thread::sleep_for(std::chrono::milliseconds(50));
-  }
-  return true;
+  return WaitFor([this] {
+    return !Fetch(acme_port_, "/dir").empty() && !Root().empty() &&
+           TellDns("/clear-txt", R"({"host":"ready.test."})");
+  }, 60);
 }
 
 std::string AcmeServers::Logs() const {

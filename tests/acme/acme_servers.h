@@ -16,8 +16,8 @@
 // object, whatever the test did.
 class AcmeServers {
  public:
-  // Picks free loopback ports and makes pebble's TLS certificate in
-  // `folder` (an existing folder); nothing runs yet.
+  // Picks free loopback ports and makes the folder `folder` with pebble's
+  // TLS certificate in it; nothing runs yet.
   explicit AcmeServers(const std::string& folder);
   ~AcmeServers();
 
@@ -39,16 +39,17 @@ class AcmeServers {
   std::string Directory() const;
   std::string Resolver() const;
 
-  // A PEM text of pebble's management port ("/roots/0",
-  // "/intermediates/0"), or of another of its ports; "" when it cannot be
-  // fetched.
-  std::string Fetch(const std::string& path) const { return Fetch(management_port_, path); }
-  std::string Fetch(int port, const std::string& path) const;
+  // pebble's root certificate as PEM, from its management port; "" when it
+  // cannot be fetched.
+  std::string Root() const { return Fetch(management_port_, "/roots/0"); }
   // POSTs the JSON `body` to the fake DNS's management `path` ("/set-txt",
   // "/add-a"...). True when it answered 200.
   bool TellDns(const std::string& path, const std::string& body) const;
 
  private:
+  // The body of `path` on pebble's HTTPS `port`; "" unless it answered 200.
+  std::string Fetch(int port, const std::string& path) const;
+
   std::string folder_;
   std::string tls_certificate_;
   int acme_port_, management_port_, dns_port_, dns_management_port_;

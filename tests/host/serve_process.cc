@@ -29,23 +29,9 @@ ServeProcess::ServeProcess(const std::string& root, const std::string& web) : ro
                                     "--listen", "127.0.0.1:0", "--listen-https",
                                     "127.0.0.1:0", "--module", ORVA_TEST_MODULE_PATH};
   if (!web.empty()) words.insert(words.end(), {"--web", web});
-  std::vector<char*> argv;
-  for (std::string& word : words) argv.push_back(&word[0]);
-  argv.push_back(nullptr);
-  const std::string out_path = root_ + "/serve.out";
-  const std::string err_path = root_ + "/serve.err";
   // The output of a server started before on this root is not this one's.
-  unlink(out_path.c_str());
-  pid_ = fork();
-  if (pid_ == 0) {
-    prctl(PR_SET_PDEATHSIG, SIGKILL);  // Never outlive a crashed test.
-    int out = open(out_path.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
-    int err = open(err_path.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
-    if (out >= 0 && err >= 0 && dup2(out, STDOUT_FILENO) >= 0 && dup2(err, STDERR_FILENO) >= 0) {
-      execv(argv[0], argv.data());
-    }
-    _exit(127);
-  }
+  unlink((root_ + "/serve.out").c_str());
+  pid_ = StartProcess(words, root_ + "/serve.out", root_ + "/serve.err");
   // The token line comes last, once both listeners are set up.
   WaitFor([this] {
     int status;
@@ -111,6 +97,25 @@ long ServeProcess::MemoryKib() const {
 std::string ServeProcess::Output() const { return ReadFile(root_ + "/serve.out"); }
 std::string ServeProcess::Log() const { return ReadFile(root_ + "/serve.err"); }
 
+pid_t StartProcess(std::vector<std::string> words, const std::string& out,
+                   const std::string& err) {
+  std::vector<char*> argv;
+  for (std::string& word : words) argv.push_back(&word[0]);
+  argv.push_back(nullptr);
+  const pid_t pid = fork();
+  if (pid == 0) {
+    prctl(PR_SET_PDEATHSIG, SIGKILL);  // Never outlive a crashed test.
+    const int out_fd = open(out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
+    const int err_fd = err == out ? out_fd : open(err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
+    if (out_fd >= 0 && err_fd >= 0 && dup2(out_fd, STDOUT_FILENO) >= 0 &&
+        dup2(err_fd, STDERR_FILENO) >= 0) {
+      execv(argv[0], argv.data());
+    }
+    _exit(127);
+  }
+  return pid;
+}
+
 void ServeTest::SetUp() {
   // nginx's workers run as nobody when the tests run as root.
   chmod(scratch_.root().c_str(), 0755);
@@ -118,8 +123,8 @@ void ServeTest::SetUp() {
   ASSERT_TRUE(InitDeviceRoot(scratch_.root(), &error)) << error;
 }
 
-bool WaitFor(const std::function<bool()>& done) {
-  const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+bool WaitFor(const std::function<bool()>& done, int seconds) {
+  const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(seconds);
   while (!done()) {
     if (std::chrono::steady_clock::now() > deadline) return false;
     std::this_thread::sleep_for(std::chrono::milliseconds(10));

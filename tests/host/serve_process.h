@@ -8,6 +8,7 @@
 
 #include <functional>
 #include <string>
+#include <vector>
 
 #include <gtest/gtest.h>
 
@@ -60,6 +61,12 @@ class ServeProcess {
   int https_port_ = 0;
 };
 
+// Starts `words` (the first a full path) with its standard output in the
+// file `out` and its standard error in `err`, which may be the same file.
+// The child dies with the test. Returns its pid, -1 when fork failed.
+pid_t StartProcess(std::vector<std::string> words, const std::string& out,
+                   const std::string& err);
+
 // Tests with a device root made by init.
 class ServeTest : public testing::Test {
  protected:
@@ -67,8 +74,8 @@ class ServeTest : public testing::Test {
   TempDeviceRoot scratch_;
 };
 
-// Polls `done` every 10 ms for up to 10 s; true once it holds.
-bool WaitFor(const std::function<bool()>& done);
+// Polls `done` every 10 ms for up to `seconds`; true once it holds.
+bool WaitFor(const std::function<bool()>& done, int seconds = 10);
 
 // The number of files in `folder` (-1 when it cannot be read).
 int CountFiles(const std::string& folder);

@@ -33,22 +33,15 @@ const ASK = {
   shown: (text) => formatCertificateTime(parseCertificateTime(text)),
   validity: ([from, until]) =>
     [until && daysLeft(date(until), NOW), validityState(date(from), date(until), NOW)],
-  acmeParams: (fields) => {
-    const values = new FormData();
-    for (const [name, value] of fields) values.append(name, value);
-    return acmeSettingsParams(values);
-  },
-  acmeForm: (settings) => acmeFormValues(settings),
-  acmeDirectory: (url) => {
-    const values = acmeFormValues({ directory: url });
-    return [values.directory, values.custom_directory];
-  },
-  acmeStatus: (data) => acmeStatusLines(data),
-  domains: (text) => domainsProblem(text),
+  acmeParams: (fields) => acmeSettingsParams(fields.reduce(
+    (values, [name, value]) => { values.append(name, value); return values; }, new FormData())),
+  acmeForm: acmeFormValues,
+  acmeDirectory: (url) =>
+    ['directory', 'custom_directory'].map((name) => acmeFormValues({ directory: url })[name]),
+  acmeStatus: acmeStatusLines,
+  domains: domainsProblem,
 };
 const STAGING = 'https://acme-staging-v02.api.letsencrypt.org/directory';
-const ACME_FORM = [['domains', ' nas.example.com\n\nnas.example.com, b.example '],
-  ['email', 'admin@example.com'], ['agree_tos', 'yes'], ['key_type', 'ec256'], ['renew_days', '30']];
 const ACME_SETTINGS = { domains: ['*.example.com'], email: 'a@example.com', directory: STAGING,
   challenge: 'dns-01', dns_provider: 'httpreq', dns_credentials: ['HTTPREQ_ENDPOINT'],
   key_type: 'ec384', renew_days: 60 };
@@ -91,21 +84,18 @@ const CASES = [  // kind, input, what the page answers (a RegExp: a text it matc
   ['validity', ['2030-02-01T00:00:00Z', '2031-01-01T00:00:00Z'], [364, 'not-yet-valid']],
   ['validity', [null, null], [null, 'unknown']],
 
-  ['acmeParams', [...ACME_FORM, ['directory', 'letsencrypt'], ['challenge', 'http-01'],
-    ['dns_provider', 'ignored'], ['credential_name', 'IGNORED'], ['credential_value', 'x']],
-  { domains: '["nas.example.com","b.example"]', email: 'admin@example.com', agree_tos: 'yes',
-    directory: 'https://acme-v02.api.letsencrypt.org/directory', challenge: 'http-01',
-    key_type: 'ec256', renew_days: '30' }],
-  ['acmeParams', [...ACME_FORM, ['directory', 'custom'], ['custom_directory', 'https://ca.lan/d'],
-    ['challenge', 'dns-01'], ['dns_provider', 'httpreq'], ['credential_name', ' HTTPREQ_ENDPOINT '],
+  ['acmeParams', [['domains', ' nas.example.com\n\nnas.example.com, b.example '],
+    ['email', 'admin@example.com'], ['agree_tos', 'yes'], ['key_type', 'ec256'], ['renew_days', '30'],
+    ['directory', 'custom'], ['custom_directory', 'https://ca.lan/d'], ['challenge', 'dns-01'],
+    ['dns_provider', 'httpreq'], ['credential_name', ' HTTPREQ_ENDPOINT '],
     ['credential_value', 'http://127.0.0.1:9/'], ['credential_name', ''], ['credential_value', 'lost']],
   { domains: '["nas.example.com","b.example"]', email: 'admin@example.com', agree_tos: 'yes',
     directory: 'https://ca.lan/d', challenge: 'dns-01', key_type: 'ec256', renew_days: '30',
     dns_provider: 'httpreq', dns_credentials: '{"HTTPREQ_ENDPOINT":"http://127.0.0.1:9/"}' }],
+  ['acmeDirectory', 'https://ca.lan/d', ['custom', 'https://ca.lan/d']],
   ['acmeForm', ACME_SETTINGS, { domains: '*.example.com', email: 'a@example.com',
     directory: 'staging', custom_directory: '', challenge: 'dns-01', dns_provider: 'httpreq',
     key_type: 'ec384', renew_days: '60', credentials: ['HTTPREQ_ENDPOINT'] }],
-  ['acmeDirectory', 'https://ca.lan/d', ['custom', 'https://ca.lan/d']],
   ['acmeStatus', { settings: ACME_SETTINGS, status: { time: '2030-01-01T12:00:59Z', result: 'failed',
     error: 'urn:ietf:params:acme:error:connection' }, certificate: null, next_renewal: null }, {
     setup: `For *.example.com, from ${STAGING}.`, attempt: '2030-01-01 12:00\u00a0UTC',
