@@ -109,8 +109,7 @@ bool IsStrictCa(X509* certificate) {
 
 bool IssuedByOneOf(X509* certificate, const std::vector<X509*>& issuers) {
   for (X509* issuer : issuers) {
-    if (issuer != certificate && X509_check_issued(issuer, certificate) == X509_V_OK &&
-        X509_verify(certificate, X509_get0_pubkey(issuer)) == 1) {
+    if (issuer != certificate && IssuedBy(certificate, issuer)) {
       return true;
     }
   }

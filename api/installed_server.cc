@@ -12,21 +12,11 @@
 #include "platform/olib/orva_root.h"
 #include "toolkit/x509_names.h"
 
-namespace {
-
 X509Ptr ReadFirstCertificate(const char* devicePath) {
   FilePtr file(std::fopen(OrvaPath(devicePath).c_str(), "re"));
   if (!file) return nullptr;
   return X509Ptr(PEM_read_X509(file.get(), nullptr, RefusePemPassword, nullptr));
 }
-
-bool IssuedBy(X509* certificate, X509* issuer) {
-  if (X509_check_issued(issuer, certificate) != X509_V_OK) return false;
-  EvpPkeyPtr key(X509_get_pubkey(issuer));
-  return key && X509_verify(certificate, key.get()) == 1;
-}
-
-}  // namespace
 
 bool ReadInstalledServer(InstalledServer* server) {
   X509Ptr certificate = ReadFirstCertificate(kServerCrtPath);

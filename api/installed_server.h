@@ -4,6 +4,8 @@
 #include <ctime>
 #include <string>
 
+#include "common/raii.h"
+
 // What the renewal and the ACME status need to know of the installed
 // server certificate (the first certificate of the store's server.crt).
 struct InstalledServer {
@@ -12,6 +14,10 @@ struct InstalledServer {
   time_t not_after = 0;
   bool by_local_ca = false;  // issued (name and signature) by the store's local CA
 };
+
+// The first certificate of the store file `devicePath` (a device path);
+// null (not logged) when there is none or it does not decode.
+X509Ptr ReadFirstCertificate(const char* devicePath);
 
 // Reads the installed server certificate. True with *server filled; false
 // (not logged) when there is none or it does not decode.

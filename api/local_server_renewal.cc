@@ -1,15 +1,13 @@
 #include "api/local_server_renewal.h"
 
-#include <openssl/pem.h>
 
-#include <cstdio>
 #include <string>
 
 #include "api/certificate_info.h"
+#include "api/installed_server.h"
 #include "api/subject_reader.h"
 #include "common/api_errors.h"
 #include "common/log.h"
-#include "common/pem_password.h"
 #include "common/raii.h"
 #include "common/store_paths.h"
 #include "platform/olib/orva_root.h"
@@ -23,9 +21,7 @@ namespace {
 // The subject and the ";"-joined DNS and IP names of the installed server
 // certificate. False when it cannot be read.
 bool ReadServerNames(CSR_ARGUMENT* subject, std::string* aliases) {
-  FilePtr file(std::fopen(OrvaPath(kServerCrtPath).c_str(), "re"));
-  X509Ptr certificate(file ? PEM_read_X509(file.get(), nullptr, RefusePemPassword, nullptr)
-                           : nullptr);
+  X509Ptr certificate = ReadFirstCertificate(kServerCrtPath);
   if (!certificate) return false;
   Json::Value names(Json::objectValue);
   X509_NAME2Json(X509_get_subject_name(certificate.get()), names);

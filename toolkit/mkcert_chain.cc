@@ -13,20 +13,12 @@
 #include "platform/olib/olib_error.h"
 #include "platform/olib/olib_file.h"
 #include "toolkit/mkcert.h"
+#include "toolkit/x509_names.h"
 
 namespace {
 
 bool IsPresentFile(const char* path) {
   return path != nullptr && *path != '\0' && OLIBCFileExist(path) != 0;
-}
-
-// True when `issuer` issued `subject`: the names agree and the issuer's
-// key verifies the subject's signature.
-bool Issued(X509* issuer, X509* subject) {
-  bool issued = X509_check_issued(issuer, subject) == X509_V_OK &&
-                X509_verify(subject, X509_get0_pubkey(issuer)) == 1;
-  ERR_clear_error();
-  return issued;
 }
 
 }  // namespace
@@ -71,7 +63,7 @@ int verifyCrtChain(const char* certPath, const char* upperPath) {
   for (size_t placed = 1; placed < certificates.size(); ++placed) {
     size_t next = 0;
     for (size_t i = 1; i < certificates.size() && next == 0; ++i) {
-      if (!used[i] && Issued(certificates[i].get(), certificates[below].get())) next = i;
+      if (!used[i] && IssuedBy(certificates[below].get(), certificates[i].get())) next = i;
     }
     if (next == 0) return 1;
     used[next] = true;

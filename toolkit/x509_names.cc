@@ -2,6 +2,7 @@
 
 #include <arpa/inet.h>
 #include <openssl/crypto.h>
+#include <openssl/err.h>
 
 std::string Utf8Text(const ASN1_STRING* value) {
   unsigned char* text = nullptr;
@@ -54,4 +55,11 @@ std::vector<AltName> AltNamesOf(const GENERAL_NAMES* names) {
     }
   }
   return entries;
+}
+
+bool IssuedBy(X509* subject, X509* issuer) {
+  const bool issued = X509_check_issued(issuer, subject) == X509_V_OK &&
+                      X509_verify(subject, X509_get0_pubkey(issuer)) == 1;
+  ERR_clear_error();
+  return issued;
 }

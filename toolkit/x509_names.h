@@ -25,4 +25,8 @@ std::string Utf8Text(const ASN1_STRING* value);
 // The first common name of `name` as UTF-8 text; "" when it has none.
 std::string CommonNameOf(const X509_NAME* name);
 
+// True when `issuer` issued `subject`: the names agree and the issuer's key
+// verifies the subject's signature. Leaves no error in the thread's queue.
+bool IssuedBy(X509* subject, X509* issuer);
+
 #endif  // ORVA_TOOLKIT_X509_NAMES_H_

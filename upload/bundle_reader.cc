@@ -14,6 +14,7 @@
 #include "common/api_errors.h"
 #include "common/log.h"
 #include "common/raii.h"
+#include "toolkit/x509_names.h"
 
 namespace {
 
@@ -147,11 +148,6 @@ int ReadPkcs12Bundle(const std::string& content, const std::string& password,
     bundle->certificates.emplace_back(sk_X509_shift(others));
   }
   return kErrNone;
-}
-
-bool IssuedBy(X509* subject, X509* issuer) {
-  return X509_check_issued(issuer, subject) == X509_V_OK &&
-         X509_verify(subject, X509_get0_pubkey(issuer)) == 1;
 }
 
 // Moves the certificates of `others` that issued `leaf`, and those that
