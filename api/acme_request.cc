@@ -1,7 +1,6 @@
 #include "api/acme_request.h"
 
 #include <algorithm>
-#include <sstream>
 
 #include <json/json.h>
 
@@ -36,18 +35,6 @@ bool IsEmpty(ORVA::APIRequest* request, const char* name) {
          ((value.isArray() || value.isObject()) && value.empty());
 }
 
-// The JSON object of a text parameter; null when it is none.
-Json::Value ObjectOf(const std::string& text) {
-  Json::Value value;
-  std::istringstream stream(text);
-  Json::CharReaderBuilder reader;
-  std::string errors;
-  if (!Json::parseFromStream(reader, stream, &value, &errors) || !value.isObject()) {
-    return Json::Value();
-  }
-  return value;
-}
-
 bool ReadTexts(const Json::Value& array, std::vector<std::string>* texts) {
   for (const Json::Value& item : array) {
     if (!item.isString()) return false;
@@ -66,8 +53,10 @@ int ReadDnsSettings(ORVA::APIRequest* request, AcmeSettings* settings, AcmeSecre
   if (known < 0) return kErrFailed;
   if (known > 0) return Refuse("dns_provider");
 
-  const Json::Value credentials = ObjectOf(Text(request, "dns_credentials", "{}"));
-  if (credentials.isNull()) return Refuse("dns_credentials");
+  Json::Value credentials;
+  if (!ParseJsonObject(Text(request, "dns_credentials", "{}"), &credentials)) {
+    return Refuse("dns_credentials");
+  }
   for (const std::string& name : credentials.getMemberNames()) {
     const Json::Value& value = credentials[name];
     if (!IsVariableName(name) ||

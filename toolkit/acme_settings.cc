@@ -2,8 +2,6 @@
 
 #include <sys/stat.h>
 
-#include <sstream>
-
 #include <json/json.h>
 
 #include "common/file_util.h"
@@ -11,6 +9,7 @@
 #include "common/shell_command.h"
 #include "common/store_paths.h"
 #include "platform/olib/orva_root.h"
+#include "toolkit/acme_values.h"
 #include "toolkit/store_file.h"
 
 namespace {
@@ -38,11 +37,8 @@ std::string JsonText(const Json::Value& value) {
 int ReadJsonFile(const std::string& path, Json::Value* value) {
   std::string text;
   if (!ReadWholeFile(path, &text)) return 1;
-  std::istringstream stream(text);
-  Json::CharReaderBuilder reader;
-  std::string errors;
-  if (!Json::parseFromStream(reader, stream, value, &errors) || !value->isObject()) {
-    ORVA_LOG("%s does not read as JSON: %s", path.c_str(), errors.c_str());
+  if (!ParseJsonObject(text, value)) {
+    ORVA_LOG("%s does not read as a JSON object", path.c_str());
     return -1;
   }
   return 0;

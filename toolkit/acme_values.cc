@@ -4,6 +4,7 @@
 
 #include <cctype>
 #include <cstdlib>
+#include <memory>
 
 namespace {
 
@@ -94,5 +95,23 @@ bool IsPlainValue(const std::string& value) {
   for (unsigned char c : value) {
     if (c < 0x20 || c == 0x7F) return false;
   }
+  return true;
+}
+
+bool ParseJsonObject(const std::string& text, Json::Value* object) {
+  Json::CharReaderBuilder builder;
+  builder["stackLimit"] = 16;
+  std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
+  Json::Value parsed;
+  std::string errors;
+  try {
+    if (!reader->parse(text.data(), text.data() + text.size(), &parsed, &errors) ||
+        !parsed.isObject()) {
+      return false;
+    }
+  } catch (const Json::Exception&) {
+    return false;
+  }
+  *object = parsed;
   return true;
 }

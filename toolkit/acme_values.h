@@ -3,6 +3,8 @@
 
 #include <string>
 
+#include <json/json.h>
+
 // The shapes the ACME settings accept, each checked alone. They decide
 // nothing about meaning (whether a domain exists); they keep every value
 // that reaches the ACME client's command line or environment plain.
@@ -35,5 +37,10 @@ bool IsVariableName(const std::string& name);
 // A value that can travel in an environment entry or as one command-line
 // word: 1 to 4096 bytes, no control character (NUL included).
 bool IsPlainValue(const std::string& value);
+
+// Reads `text` as a JSON object into *object. False for anything else,
+// nesting deeper than a settings file ever needs included (the reader would
+// throw there).
+bool ParseJsonObject(const std::string& text, Json::Value* object);
 
 #endif  // ORVA_TOOLKIT_ACME_VALUES_H_

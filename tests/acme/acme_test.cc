@@ -206,6 +206,9 @@ TEST_F(AcmeTest, AFailedOrderAnswersItsCodeAndLeavesTheStoreAndTheChallengeFolde
        [&] { return Settings(R"(["refused.example.test"])"); }, 0, 5523},
       {"a bad domain is refused; nothing is set up",
        [&] { return Settings(R"(["-bad.example.test"])"); }, 5503, 5522},
+      {"credentials nested deeper than any reader goes are refused",
+       [&] { return DnsSettings(R"(["a.example.test"])", adapter, "\",\"X\":" + std::string(1100, '[')); },
+       5503, 5522},
       {"the authority goes down mid-order",
        [&] {
          adapter.OnPresent([&] { servers_->KillPebble(); });
